@@ -1,0 +1,79 @@
+// Shared core of the launcher: the fixed names every subsystem agrees on, the two pieces of
+// process-wide state that cross subsystem borders, and the narrow-text conversions.
+//
+// Portable: no platform header is included here. UTF-16 text is char16_t everywhere in portable
+// code; on Windows it is the same representation as wchar_t, and the *_win32.cpp files convert the
+// pointer type at their border.
+//
+// Threads: everything here is used from the launcher's main thread, except the conversions, which
+// keep no state and may be called from any thread.
+#ifndef LAUNCHER_CORE_CORE_H
+#define LAUNCHER_CORE_CORE_H
+
+#include <stddef.h>
+#include <stdint.h>
+
+// Status codes are signed 32-bit: 0 success, small negative numbers for the launcher's own failures,
+// anything else passed through from the VM or the self-protection stage.
+typedef int32_t Status;
+
+enum {
+    kStatusOk = 0,
+    kStatusNotFound = -1,     // library or class not found / not loaded
+    kStatusNoMainMethod = -2, // the main class has no static main(String[])
+    kStatusNoVmSilent = -3,   // the VM was not created and there was no message text
+};
+
+// Fixed names of this product. They are constants of the build, never read from the environment.
+#define LAUNCHER_EXE_NAME "QZ-Lumiscope_QZ-57.exe"
+#define LAUNCHER_LOG_RELATIVE_PATH u"QZ-LumiscopeQZ-57Nova\\logs\\QZ-LumiscopeQZ-57Nova-L.log"
+#define LAUNCHER_MAIN_CLASS "com/qz/kpo/emu57/app/ApplicationMainForm"
+#define LAUNCHER_FRAME_CLASS_NAME "com.qz.kpo.emu57.app.EmulatorFrame"
+#define LAUNCHER_SPLASH_RESOURCE "BITMAP_SPLASH_57"
+#define LAUNCHER_VM_LIBRARY "jre\\bin\\client\\jvm.dll"
+#define LAUNCHER_CLASS_PATH_JAR "emu57.jar"
+#define LAUNCHER_NO_SPLASH_SWITCH u"-noSplash"
+
+// The instance name is 8-bit text. It is the mutex name (its 18 bytes read as nine UTF-16 units)
+// and the byte string searched for in window titles. The two zero bytes behind it end the
+// nine-unit name; the array is aligned so that it can be read as UTF-16.
+extern const char InstanceName[20];
+enum { kInstanceNameBytes = 18 };
+
+enum { kHandOffPort = 6152 };
+
+enum { kMaxPathUnits = 260 };
+
+// "QZ-Lumiscope_QZ-57.exe" once the documents folder was found, empty otherwise. Written by the
+// start-up sequence before any other thread exists; read by the start-up sequence and the
+// self-protection stage as the tag of their log lines.
+extern char ModuleName[260];
+
+// Set when "-noSplash" is the first argument (start-up) or any argument (VM host). Main thread only.
+extern bool NoSplash;
+
+// Narrow text is the thread's ANSI code page on Windows (UTF-8 on POSIX). All conversions take a
+// zero-terminated source (source length -1) and use no flags.
+//
+// NarrowSize / WideSize: the size the converted text needs, terminator included (bytes / units);
+// 0 when the text cannot be converted.
+int NarrowSize(const char16_t* text);
+int WideSize(const char* text);
+// ToNarrow / ToWide: convert into the caller's buffer; result as the platform's conversion call
+// (units or bytes written including the terminator, 0 on failure). ToWide converts at most
+// `sourceBytes` bytes of the source (-1: up to and with the terminator).
+int ToNarrow(const char16_t* text, char* out, int outBytes);
+int ToWide(const char* text, int sourceBytes, char16_t* out, int outUnits);
+
+// Heap copy of `text` in the other encoding, or null when the conversion fails. Never released by
+// the launcher (its log and VM option texts live until the process ends).
+char* NarrowCopy(const char16_t* text);
+char16_t* WideCopy(const char* text);
+
+// Length in UTF-16 units of a zero-terminated text.
+size_t Utf16Length(const char16_t* text);
+
+// ASCII-only case-insensitive comparison, as the C runtime's _wcsicmp does in the "C" locale.
+int Utf16CompareNoCase(const char16_t* a, const char16_t* b);
+
+#endif

@@ -1,0 +1,105 @@
+// Diagnostic log: line layout and levels. The file itself is reached through LogPlatform*.
+#include "log.h"
+
+#include <stdio.h>
+#include <stdlib.h>
+#include <string.h>
+#include <time.h>
+
+namespace {
+
+LogHandle g_handle = 0;          // 0: never opened; otherwise what the platform's open returned
+const int32_t g_threshold = 0;   // lowest level written; nothing in the launcher changes it
+uint32_t g_lastRequest = 0;      // bookkeeping of the piece writer, kept for inspection in a debugger
+uint32_t g_lastWritten = 0;
+uint32_t g_lastResult = 0;
+
+const char16_t kSeparator[] = u" : ";
+const char16_t kLineEnd[] = u"\r\n";
+
+// One piece: the text without its terminator, one write. A failure is reported on standard output
+// (normally lost in a windowed process) and the line goes on with its next piece.
+int WritePiece(const char16_t* piece) {
+    uint32_t bytes = static_cast<uint32_t>(Utf16Length(piece) * sizeof(char16_t));
+    uint32_t written = 0;
+    uint32_t error = 0;
+    g_lastRequest = bytes;
+    bool ok = LogPlatformWrite(g_handle, piece, bytes, &written, &error);
+    g_lastWritten = written;
+    g_lastResult = ok ? 1 : 0;
+    if (!ok) {
+        printf("WriteFile failed with error %d.\n", static_cast<int>(error));
+        return 5;
+    }
+    return 0;
+}
+
+// Narrow text back to UTF-16 as the log has always done it: ask for the count (terminator
+// included), take count + 1 units, convert count + 1 bytes of the source. The source buffers are
+// zero-filled one byte past their text, so the extra byte converts to a second terminator.
+const char16_t* WidenForLog(const char* text) {
+    int count = WideSize(text);
+    if (count <= 0) return u"";
+    char16_t* wide = static_cast<char16_t*>(malloc((static_cast<size_t>(count) + 1) * sizeof(char16_t)));
+    if (wide == nullptr) return u"";
+    if (ToWide(text, count + 1, wide, count + 1) == 0) return u"";
+    return wide;
+}
+
+}  // namespace
+
+void LogWriteText(int32_t level, const char16_t* tag, const char16_t* message) {
+    if (g_handle == 0) return;
+    if (level < g_threshold) return;
+    WritePiece(tag);
+    WritePiece(kSeparator);
+    WritePiece(message);
+    WritePiece(kLineEnd);
+}
+
+void LogWrite(int32_t level, const char16_t* tag, const char16_t* message, int32_t code) {
+    if (g_handle == 0) return;
+    if (level < g_threshold) return;
+    // The message goes through the narrow code page and back on purpose: characters the code page
+    // lacks arrive as its default character, as in every log this launcher has written.
+    const char* narrow = NarrowCopy(message);
+    if (narrow == nullptr) narrow = "";
+    char formatted[1001] = {0};
+    snprintf(formatted, 1000, "%s : %d", narrow, static_cast<int>(code));
+    WritePiece(tag);
+    WritePiece(kSeparator);
+    WritePiece(WidenForLog(formatted));
+    WritePiece(kLineEnd);
+}
+
+void LogOpen(const char16_t* path) {
+    if (g_handle != 0) return;
+    g_handle = LogPlatformOpen(path);
+    if (g_handle == kLogInvalidHandle || g_handle == 0) return;
+
+    // The C runtime's asctime layout with a zero-padded day, English names, and its line feed,
+    // which stays in front of the line's own CR LF.
+    static const char kDays[] = "SunMonTueWedThuFriSat";
+    static const char kMonths[] = "JanFebMarAprMayJunJulAugSepOctNovDec";
+    time_t now = time(nullptr);
+    const struct tm* t = localtime(&now);
+    char started[81] = {0};
+    if (t != nullptr) {
+        snprintf(started, 80, "Started logging...%.3s %.3s %02d %02d:%02d:%02d %d\n", kDays + 3 * (t->tm_wday % 7),
+                 kMonths + 3 * (t->tm_mon % 12), t->tm_mday, t->tm_hour, t->tm_min, t->tm_sec, t->tm_year + 1900);
+    } else {
+        snprintf(started, 80, "Started logging...");
+    }
+    LogWriteText(kLogLevelError, u"QZ_CW_startLOG", WidenForLog(started));
+}
+
+void LogClose() {
+    if (g_handle == 0) return;
+    if (g_threshold <= 0) {
+        WritePiece(u"Ended logging...");
+        WritePiece(kSeparator);
+        WritePiece(u"");
+        WritePiece(kLineEnd);
+    }
+    LogPlatformClose(g_handle);
+}

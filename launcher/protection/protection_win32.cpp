@@ -1,0 +1,3 @@
+#include "protection.h"
+Status ProtectionCheckImage() { return 0; }
+Status ProtectionCheckDebugger() { return 0; }

@@ -1,0 +1,3 @@
+#include "splash.h"
+void SplashStart(const SplashParams*) {}
+void SplashClose() {}
