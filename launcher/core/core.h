@@ -70,6 +70,10 @@ int ToWide(const char* text, int sourceBytes, char16_t* out, int outUnits);
 char* NarrowCopy(const char16_t* text);
 char16_t* WideCopy(const char* text);
 
+// Bounded printf-style formatting into `out` (always zero-terminated when size > 0; a longer text
+// is cut). On Windows this is the C runtime's own formatter, which keeps the executable small.
+void FormatText(char* out, size_t size, const char* format, ...);
+
 // Length in UTF-16 units of a zero-terminated text.
 size_t Utf16Length(const char16_t* text);
 

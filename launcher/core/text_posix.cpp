@@ -2,6 +2,9 @@
 // conversion, as a strict code-page conversion does on Windows.
 #include "core.h"
 
+#include <stdarg.h>
+#include <stdio.h>
+
 namespace {
 
 // Encodes `text` as UTF-8 into `out` (when non-null, capacity `outBytes`); returns the bytes needed
@@ -87,4 +90,12 @@ int ToNarrow(const char16_t* text, char* out, int outBytes) {
 }
 int ToWide(const char* text, int sourceBytes, char16_t* out, int outUnits) {
     return text == nullptr ? 0 : DecodeUtf8(text, sourceBytes, out, outUnits);
+}
+
+void FormatText(char* out, size_t size, const char* format, ...) {
+    if (size == 0) return;
+    va_list args;
+    va_start(args, format);
+    vsnprintf(out, size, format, args);
+    va_end(args);
 }

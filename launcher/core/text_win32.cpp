@@ -2,6 +2,8 @@
 #include "core.h"
 
 #include <windows.h>
+#include <stdarg.h>
+#include <stdio.h>
 
 int NarrowSize(const char16_t* text) {
     if (text == nullptr) return 0;
@@ -22,4 +24,13 @@ int ToNarrow(const char16_t* text, char* out, int outBytes) {
 int ToWide(const char* text, int sourceBytes, char16_t* out, int outUnits) {
     if (text == nullptr) return 0;
     return MultiByteToWideChar(CP_THREAD_ACP, 0, text, sourceBytes, reinterpret_cast<LPWSTR>(out), outUnits);
+}
+
+void FormatText(char* out, size_t size, const char* format, ...) {
+    if (size == 0) return;
+    va_list args;
+    va_start(args, format);
+    _vsnprintf(out, size - 1, format, args);  // does not terminate a text that fills the buffer
+    va_end(args);
+    out[size - 1] = 0;
 }

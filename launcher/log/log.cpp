@@ -65,7 +65,7 @@ void LogWrite(int32_t level, const char16_t* tag, const char16_t* message, int32
     const char* narrow = NarrowCopy(message);
     if (narrow == nullptr) narrow = "";
     char formatted[1001] = {0};
-    snprintf(formatted, 1000, "%s : %d", narrow, static_cast<int>(code));
+    FormatText(formatted, 1000, "%s : %d", narrow, static_cast<int>(code));
     WritePiece(tag);
     WritePiece(kSeparator);
     WritePiece(WidenForLog(formatted));
@@ -85,10 +85,10 @@ void LogOpen(const char16_t* path) {
     const struct tm* t = localtime(&now);
     char started[81] = {0};
     if (t != nullptr) {
-        snprintf(started, 80, "Started logging...%.3s %.3s %02d %02d:%02d:%02d %d\n", kDays + 3 * (t->tm_wday % 7),
+        FormatText(started, 80, "Started logging...%.3s %.3s %02d %02d:%02d:%02d %d\n", kDays + 3 * (t->tm_wday % 7),
                  kMonths + 3 * (t->tm_mon % 12), t->tm_mday, t->tm_hour, t->tm_min, t->tm_sec, t->tm_year + 1900);
     } else {
-        snprintf(started, 80, "Started logging...");
+        FormatText(started, 80, "Started logging...");
     }
     LogWriteText(kLogLevelError, u"QZ_CW_startLOG", WidenForLog(started));
 }

@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Draws the launcher's icon (a bright lens ring on a deep blue tile) as a .ico with 48, 32 and
+"""Draws the launcher's icon (a bright lens ring on a deep blue tile) as a .ico with 32 and
 16 pixel images, 32-bit with alpha. Our own design, computed pixel by pixel."""
 import math
 import struct
@@ -39,7 +39,7 @@ def draw(size):
 
 
 def main():
-    sizes = [48, 32, 16]
+    sizes = [32, 16]
     images = [draw(s) for s in sizes]
     out = struct.pack("<HHH", 0, 1, len(images))
     offset = 6 + 16 * len(images)

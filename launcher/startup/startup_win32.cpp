@@ -43,7 +43,7 @@ void LogStage(int32_t level, const char* stageText, int32_t code) {
     LogWrite(level, WidenForLog(ModuleName), WidenForLog(stageText), code);
 }
 
-void SetStage(char* stageText, const char* text) { snprintf(stageText, 1024, "%s", text); }
+void SetStage(char* stageText, const char* text) { FormatText(stageText, 1024, "%s", text); }
 
 }  // namespace
 
@@ -55,7 +55,7 @@ int WINAPI WinMain(HINSTANCE instance, HINSTANCE, LPSTR, int) {
     // no log path and no tag, and the log simply stays closed.
     if (SUCCEEDED(SHGetFolderPathW(nullptr, CSIDL_PERSONAL | CSIDL_FLAG_CREATE, nullptr, SHGFP_TYPE_CURRENT, logPath))) {
         PathAppendW(logPath, reinterpret_cast<LPCWSTR>(LAUNCHER_LOG_RELATIVE_PATH));
-        snprintf(ModuleName, sizeof ModuleName, "%s", LAUNCHER_EXE_NAME);
+        FormatText(ModuleName, sizeof ModuleName, "%s", LAUNCHER_EXE_NAME);
     }
     // 2. Always opened, with an empty path when the folder is unknown (that open fails quietly).
     LogOpen(reinterpret_cast<const char16_t*>(logPath));

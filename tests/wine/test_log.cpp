@@ -1,0 +1,130 @@
+// The launcher's log, byte for byte: UTF-16LE without a byte-order mark, four pieces per line, the
+// start line's extra line feed, the end line's trailing blank.
+#include <gtest/gtest.h>
+
+#include <ctime>
+#include <regex>
+
+#include "support/expect.h"
+#include "support/testbed.h"
+
+namespace {
+
+// The start line's date is the only part that changes from run to run. It must be the C runtime's
+// asctime layout with a zero-padded day ("Sat Nov 21 09:05:03 2026") and close to now.
+void ExpectRecentDate(const std::string& date) {
+    static const std::regex layout("(Sun|Mon|Tue|Wed|Thu|Fri|Sat) (Jan|Feb|Mar|Apr|May|Jun|Jul|Aug|Sep|Oct|Nov|Dec) "
+                                   "[0-3][0-9] [0-2][0-9]:[0-5][0-9]:[0-5][0-9] [0-9]{4}");
+    ASSERT_TRUE(std::regex_match(date, layout)) << date;
+    std::tm parsed = {};
+    static const char* months = "JanFebMarAprMayJunJulAugSepOctNovDec";
+    parsed.tm_mon = static_cast<int>(std::string(months).find(date.substr(4, 3)) / 3);
+    parsed.tm_mday = std::stoi(date.substr(8, 2));
+    parsed.tm_hour = std::stoi(date.substr(11, 2));
+    parsed.tm_min = std::stoi(date.substr(14, 2));
+    parsed.tm_sec = std::stoi(date.substr(17, 2));
+    parsed.tm_year = std::stoi(date.substr(20, 4)) - 1900;
+    parsed.tm_isdst = -1;
+    double age = std::difftime(std::time(nullptr), std::mktime(&parsed));
+    EXPECT_GE(age, -5);
+    EXPECT_LE(age, 300) << date;
+}
+
+// Checks the whole file against the start line followed by `rest`, exactly.
+void ExpectLog(const std::string& bytes, const std::string& rest) {
+    const std::string prefix = bed::Utf16Bytes(expect::kStartPrefix);
+    ASSERT_GE(bytes.size(), prefix.size() + 2 * 24);
+    ASSERT_EQ(bytes.substr(0, prefix.size()), prefix) << "no byte-order mark, start line first";
+    std::string date;
+    for (size_t i = 0; i < 24; ++i) {
+        ASSERT_EQ(bytes[prefix.size() + 2 * i + 1], '\0');
+        date.push_back(bytes[prefix.size() + 2 * i]);
+    }
+    ExpectRecentDate(date);
+    const std::string expected = prefix + bed::Utf16Bytes(date) + bed::Utf16Bytes("\n\r\n" + rest);
+    EXPECT_EQ(bytes.size(), expected.size());
+    EXPECT_EQ(bytes, expected);
+}
+
+const std::string kProgress = expect::Line("Preliminary Definitions", 0) + expect::Line("CL interpretation", 0);
+const std::string kEnd = expect::Line("Successful launch end.", 0) + expect::kEndLine;
+
+TEST(Log, WholeSuccessfulRun) {
+    bed::ResetLog();
+    std::wstring app = bed::MakeAppDir();
+    bed::RunResult run = bed::RunLauncher(app, L"-noSplash");
+    ASSERT_FALSE(run.timedOut);
+    EXPECT_EQ(run.exitCode, 0u);
+    ExpectLog(bed::ReadFileBytes(bed::LogPath()), kProgress + kEnd);
+}
+
+TEST(Log, FailedVmLoadStillEndsTheLog) {
+    bed::ResetLog();
+    bed::AppOptions options;
+    options.vm = bed::Vm::None;
+    bed::RunResult run = bed::RunLauncher(bed::MakeAppDir(options), L"-noSplash");
+    EXPECT_EQ(run.exitCode, 0xFFFFFFFFu);
+    ExpectLog(bed::ReadFileBytes(bed::LogPath()), kProgress + kEnd);
+}
+
+TEST(Log, SecondRunTruncatesTheLog) {
+    bed::ResetLog();
+    std::wstring app = bed::MakeAppDir();
+    // A long earlier log: a run that only truncated part of it would leave a tail behind.
+    {
+        HANDLE h = CreateFileW(bed::LogPath().c_str(), GENERIC_WRITE, 0, nullptr, CREATE_ALWAYS, 0, nullptr);
+        ASSERT_NE(h, INVALID_HANDLE_VALUE);
+        std::string old(64 * 1024, 'x');
+        DWORD done = 0;
+        WriteFile(h, old.data(), static_cast<DWORD>(old.size()), &done, nullptr);
+        CloseHandle(h);
+    }
+    ASSERT_EQ(bed::RunLauncher(app, L"-noSplash").exitCode, 0u);
+    ASSERT_EQ(bed::RunLauncher(app, L"-noSplash").exitCode, 0u);
+    ExpectLog(bed::ReadFileBytes(bed::LogPath()), kProgress + kEnd);
+}
+
+TEST(Log, MissingLogsFolderLeavesNoFileAndLaunchCompletes) {
+    bed::ResetLog(false);
+    ASSERT_FALSE(bed::FileExists(bed::LogDir()));
+    std::wstring app = bed::MakeAppDir();
+    bed::RunResult run = bed::RunLauncher(app, L"-noSplash");
+    EXPECT_EQ(run.exitCode, 0u);
+    EXPECT_FALSE(bed::FileExists(bed::LogPath()));
+    EXPECT_FALSE(bed::FileExists(bed::LogDir())) << "the log never creates its folder";
+    // The launch itself went all the way: main ran and the VM was destroyed.
+    std::vector<std::string> record = bed::ReadRecord(app);
+    ASSERT_FALSE(record.empty());
+    EXPECT_EQ(record.back(), "DestroyJavaVM");
+    bed::ResetLog();
+}
+
+TEST(Log, LogHeldOpenByAnotherProcessIsLeftAlone) {
+    bed::ResetLog();
+    HANDLE held = CreateFileW(bed::LogPath().c_str(), GENERIC_WRITE, FILE_SHARE_READ, nullptr, CREATE_ALWAYS,
+                              FILE_ATTRIBUTE_NORMAL, nullptr);
+    ASSERT_NE(held, INVALID_HANDLE_VALUE);
+    DWORD done = 0;
+    WriteFile(held, "held", 4, &done, nullptr);
+    std::wstring app = bed::MakeAppDir();
+    bed::RunResult run = bed::RunLauncher(app, L"-noSplash");
+    CloseHandle(held);
+    EXPECT_EQ(run.exitCode, 0u);
+    EXPECT_EQ(bed::ReadFileBytes(bed::LogPath()), "held");
+    std::vector<std::string> record = bed::ReadRecord(app);
+    ASSERT_FALSE(record.empty());
+    EXPECT_EQ(record.back(), "DestroyJavaVM");
+}
+
+TEST(Log, ProcessEndedFromInsideMainWritesNoClosingLines) {
+    // System.exit from the Java side ends the process inside main: the log keeps what was written.
+    bed::ResetLog();
+    bed::AppOptions options;
+    options.script = "main_exit=1012\n";
+    bed::RunResult run = bed::RunLauncher(bed::MakeAppDir(options), L"-noSplash");
+    EXPECT_EQ(run.exitCode, 1012u);
+    EXPECT_TRUE(run.boxes.empty());
+    ExpectLog(bed::ReadFileBytes(bed::LogPath()), kProgress);
+}
+
+}  // namespace
