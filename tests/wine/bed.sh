@@ -77,6 +77,8 @@ case "$action" in
   run)
     # shellcheck disable=SC1091
     . "$state/env.sh" || { say "no bed at $state (run setup first)"; exit 1; }
+    # A wineserver started by `wine` itself would inherit (and hold open) the caller's output.
+    wineserver -p </dev/null >/dev/null 2>&1
     exec wine "$@" ;;
   env) cat "$state/env.sh" ;;
   teardown)
