@@ -34,3 +34,15 @@ void FormatText(char* out, size_t size, const char* format, ...) {
     va_end(args);
     out[size - 1] = 0;
 }
+
+void PrintText(const char* format, ...) {
+    // Formatted by the C runtime itself and written with fputs: MinGW's C++ headers would turn a
+    // plain vprintf into its own, much larger, printf.
+    char text[1024];
+    va_list args;
+    va_start(args, format);
+    _vsnprintf(text, sizeof text - 1, format, args);
+    va_end(args);
+    text[sizeof text - 1] = 0;
+    fputs(text, stdout);
+}

@@ -28,7 +28,7 @@ int WritePiece(const char16_t* piece) {
     g_lastWritten = written;
     g_lastResult = ok ? 1 : 0;
     if (!ok) {
-        printf("WriteFile failed with error %d.\n", static_cast<int>(error));
+        PrintText("WriteFile failed with error %d.\n", static_cast<int>(error));
         return 5;
     }
     return 0;
