@@ -107,10 +107,19 @@ TEST(Log, LogHeldOpenByAnotherProcessIsLeftAlone) {
     DWORD done = 0;
     WriteFile(held, "held", 4, &done, nullptr);
     std::wstring app = bed::MakeAppDir();
-    bed::RunResult run = bed::RunLauncher(app, L"-noSplash");
+    bed::RunOptions options;
+    options.captureOutput = true;
+    bed::RunResult run = bed::RunLauncher(app, L"-noSplash", options);
     CloseHandle(held);
     EXPECT_EQ(run.exitCode, 0u);
     EXPECT_EQ(bed::ReadFileBytes(bed::LogPath()), "held");
+    // Every piece of the three lines and the end line is attempted on the failed handle, and each
+    // failure is reported on standard output (which a windowed launcher normally has not). The
+    // C runtime's text-mode stream writes the line feed as CR LF.
+    std::string failed = "WriteFile failed with error 6.\r\n";
+    std::string expected;
+    for (int i = 0; i < 4 * 4; ++i) expected += failed;
+    EXPECT_EQ(run.output, expected);
     std::vector<std::string> record = bed::ReadRecord(app);
     ASSERT_FALSE(record.empty());
     EXPECT_EQ(record.back(), "DestroyJavaVM");

@@ -125,6 +125,9 @@ struct Running {
     std::thread watcher;
     std::atomic<bool> stop{false};
     std::vector<MessageBoxInfo> boxes;  // written by the watcher only until it is joined
+    HANDLE outputRead = nullptr;
+    std::thread reader;
+    std::string output;  // written by the reader only until it is joined
 };
 
 namespace {
@@ -189,11 +192,33 @@ Running* Start(const std::wstring& application, const std::wstring& commandLine,
     running->options = options;
     STARTUPINFOW startup{};
     startup.cb = sizeof startup;
+    HANDLE outputWrite = nullptr;
+    if (options.captureOutput) {
+        SECURITY_ATTRIBUTES inherit{sizeof inherit, nullptr, TRUE};
+        CreatePipe(&running->outputRead, &outputWrite, &inherit, 0);
+        SetHandleInformation(running->outputRead, HANDLE_FLAG_INHERIT, 0);
+        startup.dwFlags = STARTF_USESTDHANDLES;
+        startup.hStdOutput = outputWrite;
+        startup.hStdError = outputWrite;
+        startup.hStdInput = GetStdHandle(STD_INPUT_HANDLE);
+    }
     std::wstring mutableLine = commandLine;
     running->startTick = GetTickCount();
-    if (!CreateProcessW(application.c_str(), &mutableLine[0], nullptr, nullptr, FALSE, 0, nullptr,
-                        workingDir.empty() ? nullptr : workingDir.c_str(), &startup, &running->process)) {
+    BOOL started = CreateProcessW(application.c_str(), &mutableLine[0], nullptr, nullptr, options.captureOutput, 0,
+                                  nullptr, workingDir.empty() ? nullptr : workingDir.c_str(), &startup,
+                                  &running->process);
+    if (outputWrite != nullptr) CloseHandle(outputWrite);  // the child holds the only write end now
+    if (running->outputRead != nullptr) {
+        running->reader = std::thread([running] {
+            char buffer[4096];
+            DWORD got = 0;
+            while (ReadFile(running->outputRead, buffer, sizeof buffer, &got, nullptr) && got > 0)
+                running->output.append(buffer, got);
+        });
+    }
+    if (!started) {
         running->process.hProcess = nullptr;
+        if (running->reader.joinable()) running->reader.join();
         return running;
     }
     running->watcher = std::thread(WatchBoxes, running);
@@ -208,6 +233,7 @@ RunResult Finish(Running* running) {
     if (running->process.hProcess == nullptr) {
         result.exitCode = 0xFFFFFFFF;
         result.timedOut = true;
+        if (running->outputRead != nullptr) CloseHandle(running->outputRead);
         delete running;
         return result;
     }
@@ -220,6 +246,9 @@ RunResult Finish(Running* running) {
     }
     running->stop = true;
     if (running->watcher.joinable()) running->watcher.join();
+    if (running->reader.joinable()) running->reader.join();
+    if (running->outputRead != nullptr) CloseHandle(running->outputRead);
+    result.output = running->output;
     GetExitCodeProcess(running->process.hProcess, &result.exitCode);
     result.boxes = running->boxes;
     CloseHandle(running->process.hThread);

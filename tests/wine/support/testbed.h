@@ -49,6 +49,7 @@ struct RunResult {
     DWORD exitCode = 0;   // full 32-bit exit code
     bool timedOut = false;  // the process was killed after the time limit
     std::vector<MessageBoxInfo> boxes;  // in the order they appeared
+    std::string output;   // standard output, when RunOptions::captureOutput was set
 };
 struct RunOptions {
     DWORD timeoutMs = 60000;
@@ -56,6 +57,8 @@ struct RunOptions {
     // Watch boxes of every other process, not only the started one (for programs that start the
     // launcher themselves, such as a debugger).
     bool anyProcess = false;
+    // Give the program a pipe as standard output and collect what it writes.
+    bool captureOutput = false;
     // Called on the watcher thread for each box before it is dismissed.
     std::function<void(const MessageBoxInfo&, HWND)> onBox;
 };
