@@ -67,8 +67,6 @@ setup() {
   for docs in "$WINEPREFIX"/drive_c/users/*/Documents; do
     [ -L "$docs" ] && rm -f "$docs" && mkdir -p "$docs"
   done
-  timeout 60 wineserver -w 2>/dev/null
-  wineserver -p </dev/null >/dev/null 2>&1
   say "ready"
 }
 
@@ -77,8 +75,11 @@ case "$action" in
   run)
     # shellcheck disable=SC1091
     . "$state/env.sh" || { say "no bed at $state (run setup first)"; exit 1; }
-    # A wineserver started by `wine` itself would inherit (and hold open) the caller's output.
+    # A wineserver, or Wine's own system processes (services, explorer), started on behalf of the
+    # program would inherit and hold open the caller's output, so a test runner reading it would
+    # wait for them. Start them detached first; they stay up until teardown.
     wineserver -p </dev/null >/dev/null 2>&1
+    timeout 120 wineboot </dev/null >/dev/null 2>&1
     exec wine "$@" ;;
   env) cat "$state/env.sh" ;;
   teardown)
