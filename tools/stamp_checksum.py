@@ -1,51 +1,67 @@
 #!/usr/bin/env python3
 """Stamps the PE image checksum into an executable's optional header, in place.
 
-GNU ld leaves the field 0; the launcher compares it with a checksum of its own file at start-up.
-The algorithm is the platform's: 16-bit one's-complement-style sum of the file with the checksum
-field taken as zero, folded to 16 bits, plus the file length.
-Usage: stamp_checksum.py FILE [--print]   (--print only prints stamped and computed values)
+GNU ld leaves the field 0; the launcher compares it with a checksum of its own file at start-up
+(launcher/protection). The sum is the usual image checksum: the file's little-endian 16-bit words
+(an odd last byte as a word of its own) added with end-around carry, the four bytes of the checksum
+field counted as zero, then the file length added. Stamping twice gives the same file.
+
+Usage: stamp_checksum.py FILE [--print]
+  --print  only prints the stamped and the computed value; exit status 1 when they differ
 """
 import struct
 import sys
 from array import array
 
+CHECKSUM_IN_OPTIONAL_HEADER = 64  # the same in PE32 and PE32+
+
 
 def checksum_offset(data: bytes) -> int:
-    if data[:2] != b"MZ":
+    if len(data) < 0x40 or data[:2] != b"MZ":
         raise ValueError("not an MZ image")
     pe = struct.unpack_from("<I", data, 0x3C)[0]
-    if data[pe:pe + 4] != b"PE\0\0":
-        raise ValueError("no PE signature")
-    return pe + 4 + 20 + 64  # signature, file header, then CheckSum at offset 64 of the optional header
+    field = pe + 4 + 20 + CHECKSUM_IN_OPTIONAL_HEADER  # signature, file header, optional header
+    if field + 4 > len(data) or data[pe:pe + 4] != b"PE\0\0":
+        raise ValueError("no PE header")
+    if struct.unpack_from("<H", data, pe + 24)[0] not in (0x10B, 0x20B):
+        raise ValueError("unknown optional header")
+    return field
 
 
 def pe_checksum(data: bytes, field: int) -> int:
-    padded = data + (b"\0" if len(data) % 2 else b"")
+    zeroed = bytearray(data)
+    zeroed[field:field + 4] = b"\0\0\0\0"
+    if len(zeroed) % 2:
+        zeroed.append(0)
     words = array("H")
-    words.frombytes(padded)
+    words.frombytes(bytes(zeroed))
     if sys.byteorder != "little":
         words.byteswap()
-    words[field // 2] = 0
-    words[field // 2 + 1] = 0
-    total = 0
-    for start in range(0, len(words), 1 << 15):  # fold often enough to stay small
-        total += sum(words[start:start + (1 << 15)])
-        total = (total & 0xFFFF) + (total >> 16)
+    # A plain sum folded once at the end equals the running end-around-carry sum.
+    total = sum(words)
     while total >> 16:
         total = (total & 0xFFFF) + (total >> 16)
     return (total + len(data)) & 0xFFFFFFFF
 
 
-def main() -> int:
-    path = sys.argv[1]
+def main(argv) -> int:
+    args = [a for a in argv[1:] if a != "--print"]
+    if len(args) != 1 or len(argv) - len(args) > 2:
+        print("usage: stamp_checksum.py FILE [--print]", file=sys.stderr)
+        return 2
+    path = args[0]
     with open(path, "rb") as f:
         data = f.read()
-    field = checksum_offset(data)
+    try:
+        field = checksum_offset(data)
+    except ValueError as error:
+        print("%s: %s" % (path, error), file=sys.stderr)
+        return 1
     value = pe_checksum(data, field)
-    if "--print" in sys.argv[2:]:
-        print("stamped=0x%08x computed=0x%08x" % (struct.unpack_from("<I", data, field)[0], value))
-        return 0
+    if "--print" in argv[1:]:
+        stamped = struct.unpack_from("<I", data, field)[0]
+        print("stamped=0x%08x computed=0x%08x" % (stamped, value))
+        return 0 if stamped == value else 1
     with open(path, "r+b") as f:
         f.seek(field)
         f.write(struct.pack("<I", value))
@@ -53,4 +69,4 @@ def main() -> int:
 
 
 if __name__ == "__main__":
-    sys.exit(main())
+    sys.exit(main(sys.argv))
