@@ -18,6 +18,7 @@ BASE_PKGS=(
   g++-mingw-w64-i686 g++-mingw-w64-x86-64 binutils-mingw-w64-i686 binutils-mingw-w64-x86-64
   wine wine64 xvfb xdotool x11-utils imagemagick xcompmgr
   googletest g++
+  clang libclang-rt-dev  # libFuzzer, for the fuzz target in tests/fuzz
   openjdk-17-jdk-headless
 )
 

@@ -1,3 +1,239 @@
+// The splash window on Windows: a layered, borderless tool window on a thread of its own that fades
+// in from opacity 64 to 252 and closes when its display time is up or when the launcher asks.
+//
+// Threads: SplashStart and SplashClose run on the main thread, everything else on the splash thread
+// (its window procedure included). The only thing the two share is gSplashWindow, written once by
+// the splash thread after the window exists and read by SplashClose, without a lock: a close that
+// comes before the handle is published simply has no effect.
+//
+// Every failure is silent. A missing or unreadable picture ends the thread before any window exists,
+// and the launch goes on unchanged.
 #include "splash.h"
-void SplashStart(const SplashParams*) {}
-void SplashClose() {}
+
+#include <windows.h>
+#include <vfw.h>
+
+namespace {
+
+const wchar_t kClassName[] = L"SplashScreenWndClass";
+const wchar_t kResourceType[] = L"SPLASH";
+
+enum : UINT_PTR { kCloseTimer = 1, kFadeTimer = 2 };
+const UINT kFadeIntervalMs = 5;
+const int kFirstAlpha = 64;
+const int kAlphaStep = 4;
+
+// What the paint handler needs. Lives on the splash thread's stack for the life of the window and
+// hangs on the window as its user data.
+struct SplashWindowData {
+    HDRAWDIB drawDib;
+    const uint8_t* bitmapFile;  // the locked resource: a whole bitmap file image
+    DWORD bitmapBytes;          // its size, for the bounds-checked reader
+    int32_t width;
+    int32_t height;
+};
+
+typedef BOOL(WINAPI* SetLayeredWindowAttributesProc)(HWND, COLORREF, BYTE, DWORD);
+
+// Process-wide state. The window handle is never cleared and the fade is never restarted: there is
+// one splash per process.
+HWND volatile gSplashWindow = nullptr;
+int gFadeAlpha = kFirstAlpha;
+HMODULE gUser32 = nullptr;
+SetLayeredWindowAttributesProc gSetLayeredWindowAttributes = nullptr;
+UINT_PTR gFadeTimer = 0;  // kept as returned, not used
+
+}  // namespace
+
+// Finds the "SPLASH" resource `name` in `module` and checks its file image. Returns the loaded
+// resource, or null when it is missing or is not a bitmap file image that fits in its size.
+HGLOBAL LoadSplashBitmap(HMODULE module, const char* name, int32_t* width, int32_t* height, DWORD* bytes) {
+    wchar_t wideName[kMaxPathUnits];
+    const wchar_t* resourceName = nullptr;
+    if (name != nullptr) {
+        if (ToWide(name, -1, reinterpret_cast<char16_t*>(wideName), kMaxPathUnits) == 0) return nullptr;
+        resourceName = wideName;
+    }
+    HRSRC found = FindResourceW(module, resourceName, kResourceType);
+    if (found == nullptr) return nullptr;
+    DWORD size = SizeofResource(module, found);
+    if (size == 0) return nullptr;
+    HGLOBAL loaded = LoadResource(module, found);
+    if (loaded == nullptr) return nullptr;
+    const uint8_t* image = static_cast<const uint8_t*>(LockResource(loaded));
+    if (image == nullptr) return nullptr;
+
+    SplashBitmapInfo info;
+    if (!ReadSplashBitmap(image, size, &info)) return nullptr;
+    *width = info.width;
+    *height = info.height;
+    *bytes = size;
+    return loaded;
+}
+
+// One step of the fade: 64, 68, ... 252, and the step after 252 stops the fade timer. Without
+// SetLayeredWindowAttributes nothing happens (the fade timer then fires harmlessly until the end).
+void SplashFadeStep(HWND window) {
+    if (gUser32 == nullptr) {
+        gUser32 = LoadLibraryW(L"user32");
+        if (gUser32 != nullptr) {
+            gSetLayeredWindowAttributes = reinterpret_cast<SetLayeredWindowAttributesProc>(
+                reinterpret_cast<void*>(GetProcAddress(gUser32, "SetLayeredWindowAttributes")));
+        }
+    }
+    if (gSetLayeredWindowAttributes == nullptr) return;
+    if (gFadeAlpha < 255) {
+        gSetLayeredWindowAttributes(window, RGB(255, 255, 255), static_cast<BYTE>(gFadeAlpha), LWA_ALPHA);
+        gFadeAlpha += kAlphaStep;
+    } else {
+        KillTimer(window, kFadeTimer);
+    }
+}
+
+// The whole picture at the window's origin, unscaled. Bit counts other than 24, 8, 4 and 1 draw nothing.
+void SplashPaint(HWND window) {
+    const SplashWindowData* data = reinterpret_cast<const SplashWindowData*>(GetWindowLongPtrW(window, GWLP_USERDATA));
+    PAINTSTRUCT paint;
+    HDC dc = BeginPaint(window, &paint);
+    SplashBitmapInfo info;
+    if (data != nullptr && data->bitmapFile != nullptr && ReadSplashBitmap(data->bitmapFile, data->bitmapBytes, &info) &&
+        info.pixelOffset != 0) {
+        BITMAPINFOHEADER* header =
+            reinterpret_cast<BITMAPINFOHEADER*>(const_cast<uint8_t*>(data->bitmapFile + info.infoOffset));
+        void* pixels = const_cast<uint8_t*>(data->bitmapFile + info.pixelOffset);
+        DrawDibDraw(data->drawDib, dc, 0, 0, data->width, data->height, header, pixels, 0, 0, data->width,
+                    data->height, DDF_HALFTONE);
+    }
+    EndPaint(window, &paint);
+}
+
+LRESULT CALLBACK SplashWndProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam) {
+    switch (message) {
+        case WM_ERASEBKGND:
+            return 1;  // the picture covers the whole window
+        case WM_DESTROY:
+            PostQuitMessage(0);
+            return 0;
+        case WM_PAINT:
+            SplashPaint(window);
+            return 0;
+        case WM_SETCURSOR:
+            return 0;  // the pointer keeps its shape over the splash
+        case WM_TIMER:
+            if (wParam == kCloseTimer) {
+                KillTimer(window, kCloseTimer);
+                SendMessageW(window, WM_CLOSE, 0, 0);
+            } else if (wParam == kFadeTimer) {
+                SplashFadeStep(window);
+            }
+            return 0;
+        default:
+            return DefWindowProcW(window, message, wParam, lParam);
+    }
+}
+
+// The splash thread: owns the parameter copy, the DrawDib handle and the window.
+DWORD WINAPI SplashThreadProc(LPVOID parameter) {
+    SplashParams* params = static_cast<SplashParams*>(parameter);
+    HINSTANCE instance = static_cast<HINSTANCE>(params->hInstance);
+
+    HDRAWDIB drawDib = DrawDibOpen();
+    if (drawDib == nullptr) {
+        GlobalFree(params);
+        return 0;
+    }
+    int32_t width = 0;
+    int32_t height = 0;
+    DWORD bytes = 0;
+    HGLOBAL bitmap =
+        LoadSplashBitmap(static_cast<HMODULE>(params->hResourceModule), params->resourceName, &width, &height, &bytes);
+    const uint8_t* bitmapFile = bitmap != nullptr ? static_cast<const uint8_t*>(LockResource(bitmap)) : nullptr;
+    if (bitmapFile == nullptr) {
+        DrawDibClose(drawDib);
+        GlobalFree(params);
+        return 0;
+    }
+
+    // Registered once per instance and never unregistered.
+    WNDCLASSEXW windowClass;
+    if (!GetClassInfoExW(instance, kClassName, &windowClass)) {
+        ZeroMemory(&windowClass, sizeof windowClass);
+        windowClass.cbSize = sizeof windowClass;
+        windowClass.lpfnWndProc = SplashWndProc;
+        windowClass.hInstance = instance;
+        windowClass.hCursor = LoadCursorW(nullptr, reinterpret_cast<LPCWSTR>(IDC_ARROW));
+        windowClass.lpszClassName = kClassName;
+        if (RegisterClassExW(&windowClass) == 0) {
+            DrawDibClose(drawDib);
+            GlobalFree(params);
+            return 0;
+        }
+    }
+
+    // Signed divisions, rounding toward zero, as the position rule says.
+    int x;
+    int y;
+    if (params->centerOnScreen != 0) {
+        x = (GetSystemMetrics(SM_CXSCREEN) - width) / 2;
+        y = (GetSystemMetrics(SM_CYSCREEN) - height) / 2;
+    } else {
+        x = params->centerX - width / 2;
+        y = params->centerY - height / 2;
+    }
+    DWORD exStyle = WS_EX_LAYERED | WS_EX_TOOLWINDOW;  // off the taskbar
+    if (params->topMost != 0) exStyle |= WS_EX_TOPMOST;
+
+    // Created hidden, exactly the picture's size. The result is not checked.
+    HWND window = CreateWindowExW(exStyle, kClassName, L"", WS_POPUP, x, y, width, height,
+                                  static_cast<HWND>(params->hwndParent), nullptr, instance, nullptr);
+    // Opacity 64 before the window is ever shown, never 0.
+    SplashFadeStep(window);
+
+    SplashWindowData data;
+    data.drawDib = drawDib;
+    data.bitmapFile = bitmapFile;
+    data.bitmapBytes = bytes;
+    data.width = width;
+    data.height = height;
+    SetWindowLongPtrW(window, GWLP_USERDATA, reinterpret_cast<LONG_PTR>(&data));
+
+    // The display time counts from here, fade included.
+    UINT_PTR closeTimer = SetTimer(window, kCloseTimer, params->displayMs, nullptr);
+    gFadeTimer = SetTimer(window, kFadeTimer, kFadeIntervalMs, nullptr);
+    if (closeTimer != 0) {
+        ShowWindow(window, SW_SHOW);
+    } else {
+        PostMessageW(window, WM_CLOSE, 0, 0);  // closes without ever being shown
+    }
+    gSplashWindow = window;
+
+    MSG message;
+    while (GetMessageW(&message, nullptr, 0, 0) != 0) {
+        TranslateMessage(&message);
+        DispatchMessageW(&message);
+    }
+    // The resource stays loaded and gSplashWindow keeps its stale value.
+    DrawDibClose(drawDib);
+    GlobalFree(params);
+    return 0;
+}
+
+void SplashStart(const SplashParams* params) {
+    SplashParams* copy = static_cast<SplashParams*>(GlobalAlloc(GPTR, sizeof(SplashParams)));
+    if (copy == nullptr) return;
+    *copy = *params;
+    bool wait = copy->waitForClose != 0;  // read before the copy belongs to the thread
+    HANDLE thread = CreateThread(nullptr, 0, SplashThreadProc, copy, 0, nullptr);
+    if (thread == nullptr) {
+        GlobalFree(copy);
+        return;
+    }
+    if (wait) WaitForSingleObject(thread, INFINITE);
+    // The thread handle stays open for the life of the process.
+}
+
+void SplashClose() {
+    // A cross-thread send: returns once the splash thread has destroyed the window. Fails quietly
+    // when there is no window (never created, not yet published or already gone).
+    SendMessageW(gSplashWindow, WM_CLOSE, 0, 0);
+}
