@@ -1,0 +1,65 @@
+// What the VM option list makes of inputs the Windows tests cannot easily produce: a drive-root
+// directory, a directory whose conversion failed, overlong values; and the byte-wise narrowing of
+// the special folders. (The full lists are checked under Wine and against the real VM.)
+#include <gtest/gtest.h>
+
+#include <string.h>
+
+#include <string>
+#include <vector>
+
+#include "jvm/jvm_internal.h"
+
+namespace {
+
+// The list only grows: returns what this composition appended.
+std::vector<std::string> Compose(const char* appDirectory) {
+    char16_t exe[] = u"D:\\QZ-Lumiscope_QZ-57.exe";
+    char16_t* argv[] = {exe};
+    VmOptionInputs in;
+    in.appDirectory = appDirectory;
+    in.argc = 1;
+    in.argv = argv;
+    in.userAppDataFound = false;
+    in.userAppData = "ignored";
+    in.commonAppDataFound = false;
+    int32_t before = VmOptionCount();
+    ComposeVmOptions(in);
+    std::vector<std::string> added;
+    for (int32_t i = before; i < VmOptionCount(); ++i) added.push_back(VmOptionRecords()[i].optionString);
+    return added;
+}
+
+TEST(ComposeVmOptions, DirectoryForms) {
+    // The re-read current directory of a drive root keeps its backslash: the separator doubles.
+    std::vector<std::string> options = Compose("D:\\");
+    ASSERT_EQ(options.size(), 10u);
+    EXPECT_EQ(options[0], "-Djava.class.path=D:\\\\emu57.jar");
+    EXPECT_EQ(options[6], "-Djava.library.path=D:\\");
+
+    options = Compose(nullptr);
+    EXPECT_EQ(options[0], "-Djava.class.path=(null)\\emu57.jar");
+    EXPECT_EQ(options[6], "-Djava.library.path=(null)");
+
+    // Each option is formatted into 1024 bytes: longer ones are cut at 1023.
+    std::string longDirectory(2000, 'd');
+    options = Compose(longDirectory.c_str());
+    EXPECT_EQ(options[0], "-Djava.class.path=" + longDirectory.substr(0, 1023 - 18));
+    EXPECT_EQ(options[6].size(), 1023u);
+}
+
+TEST(NarrowLowBytes, TakesTheLowByteOfEveryUnit) {
+    char16_t folder[kFolderPathUnits] = {};
+    std::u16string path = u"C:\\M\u00fcll\\\u4E2D\u0141";  // U+4E2D -> '-', U+0141 -> 'A'
+    memcpy(folder, path.data(), path.size() * 2);
+    char out[kFolderPathUnits + 1];
+    NarrowLowBytes(folder, out);
+    EXPECT_EQ(std::string(out), "C:\\M\xfcll\\-A");
+
+    // A full buffer without terminator is still terminated after 260 bytes.
+    for (char16_t& u : folder) u = u'z';
+    NarrowLowBytes(folder, out);
+    EXPECT_EQ(std::string(out), std::string(kFolderPathUnits, 'z'));
+}
+
+}  // namespace
