@@ -12,6 +12,22 @@
 
 namespace {
 
+// The 32-bit VM's entry point and function tables are __stdcall. A jni_md.h with an empty JNICALL
+// (the Linux one) compiles without a word and corrupts the stack only with a real runtime, so the
+// build refuses it. On x86_64 there is one calling convention and both sides are the same type.
+template <typename A, typename B>
+struct SameType {
+    static const bool value = false;
+};
+template <typename A>
+struct SameType<A, A> {
+    static const bool value = true;
+};
+static_assert(SameType<CreateJavaVmEntry, jint(__stdcall*)(JavaVM**, void**, void*)>::value,
+              "JNI_CreateJavaVM must be called as __stdcall");
+static_assert(SameType<decltype(JNINativeInterface_::FindClass), jclass(__stdcall*)(JNIEnv*, const char*)>::value,
+              "the JNI function table must be called as __stdcall");
+
 const int kMessageUnits = 1024;
 
 // Shows string `id` of the string table, converted to narrow text; false when there is no such

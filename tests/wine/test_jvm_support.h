@@ -111,85 +111,10 @@ inline std::wstring Folder(int csidl) {
     return path;
 }
 
-// Points a special folder of the prefix elsewhere through "User Shell Folders" (both registry
-// views, as the launcher may be 32- or 64-bit) and puts the previous values back when it goes.
-class FolderOverride {
-public:
-    // `root` HKEY_CURRENT_USER with value "AppData" (CSIDL_APPDATA) or HKEY_LOCAL_MACHINE with
-    // "Common AppData" (CSIDL_COMMON_APPDATA).
-    FolderOverride(HKEY root, const wchar_t* value, const std::wstring& path) : root_(root), value_(value) {
-        const REGSAM views[] = {KEY_WOW64_64KEY, KEY_WOW64_32KEY};
-        for (REGSAM view : views) {
-            Saved saved;
-            saved.view = view;
-            HKEY key = nullptr;
-            if (RegCreateKeyExW(root_, kKey, 0, nullptr, 0, KEY_QUERY_VALUE | KEY_SET_VALUE | view, nullptr, &key,
-                                nullptr) != ERROR_SUCCESS)
-                continue;
-            DWORD size = 0;
-            if (RegQueryValueExW(key, value_, nullptr, &saved.type, nullptr, &size) == ERROR_SUCCESS) {
-                saved.existed = true;
-                saved.data.resize(size);
-                RegQueryValueExW(key, value_, nullptr, &saved.type, saved.data.data(), &size);
-            }
-            RegSetValueExW(key, value_, 0, REG_EXPAND_SZ, reinterpret_cast<const BYTE*>(path.c_str()),
-                           static_cast<DWORD>((path.size() + 1) * sizeof(wchar_t)));
-            RegCloseKey(key);
-            saved_.push_back(saved);
-        }
-    }
-    ~FolderOverride() {
-        // Last saved first: where both views are one key, the first saving holds the original.
-        for (auto it = saved_.rbegin(); it != saved_.rend(); ++it) {
-            const Saved& saved = *it;
-            HKEY key = nullptr;
-            if (RegOpenKeyExW(root_, kKey, 0, KEY_SET_VALUE | saved.view, &key) != ERROR_SUCCESS) continue;
-            if (saved.existed)
-                RegSetValueExW(key, value_, 0, saved.type, saved.data.data(), static_cast<DWORD>(saved.data.size()));
-            else
-                RegDeleteValueW(key, value_);
-            RegCloseKey(key);
-        }
-    }
-    FolderOverride(const FolderOverride&) = delete;
-    FolderOverride& operator=(const FolderOverride&) = delete;
+using bed::FolderOverride;
 
-private:
-    static constexpr const wchar_t* kKey = L"Software\\Microsoft\\Windows\\CurrentVersion\\Explorer\\User Shell Folders";
-    struct Saved {
-        REGSAM view = 0;
-        bool existed = false;
-        DWORD type = 0;
-        std::vector<BYTE> data;
-    };
-    HKEY root_;
-    const wchar_t* value_;
-    std::vector<Saved> saved_;
-};
-
-struct SplashSearch {
-    DWORD pid;
-    bool found;
-};
-inline BOOL CALLBACK FindSplashWindow(HWND window, LPARAM param) {
-    SplashSearch* search = reinterpret_cast<SplashSearch*>(param);
-    DWORD pid = 0;
-    GetWindowThreadProcessId(window, &pid);
-    wchar_t name[64] = {0};
-    GetClassNameW(window, name, 64);
-    if (pid == search->pid && lstrcmpW(name, L"SplashScreenWndClass") == 0) search->found = true;
-    return TRUE;
-}
 // True once the process `pid` has its splash window, waiting up to `timeoutMs`.
-inline bool SplashUp(DWORD pid, DWORD timeoutMs) {
-    return bed::WaitFor(
-        [pid] {
-            SplashSearch search{pid, false};
-            EnumWindows(FindSplashWindow, reinterpret_cast<LPARAM>(&search));
-            return search.found;
-        },
-        timeoutMs);
-}
+inline bool SplashUp(DWORD pid, DWORD timeoutMs) { return bed::WaitForSplash(pid, timeoutMs) != nullptr; }
 
 }  // namespace jvmtest
 

@@ -142,41 +142,13 @@ TEST(Log, ProcessEndedFromInsideMainWritesNoClosingLines) {
 
 namespace {
 
-// Points the user's documents folder somewhere that cannot exist or be created, for one scope.
-class UnreachableDocuments {
-public:
-    UnreachableDocuments() {
-        RegOpenKeyExW(HKEY_CURRENT_USER, kKey, 0, KEY_READ | KEY_WRITE, &key_);
-        DWORD size = sizeof saved_;
-        hadValue_ = RegQueryValueExW(key_, L"Personal", nullptr, &type_, reinterpret_cast<BYTE*>(saved_), &size) == 0;
-        // Below a file: the folder can neither exist nor be created.
-        const wchar_t unreachable[] = L"C:\\windows\\system32\\kernel32.dll\\Documents";
-        RegSetValueExW(key_, L"Personal", 0, REG_EXPAND_SZ, reinterpret_cast<const BYTE*>(unreachable),
-                       sizeof unreachable);
-    }
-    ~UnreachableDocuments() {
-        if (hadValue_)
-            RegSetValueExW(key_, L"Personal", 0, type_, reinterpret_cast<const BYTE*>(saved_),
-                           static_cast<DWORD>((lstrlenW(saved_) + 1) * sizeof(wchar_t)));
-        else
-            RegDeleteValueW(key_, L"Personal");
-        RegCloseKey(key_);
-    }
-
-private:
-    static constexpr const wchar_t* kKey = L"Software\\Microsoft\\Windows\\CurrentVersion\\Explorer\\User Shell Folders";
-    HKEY key_ = nullptr;
-    DWORD type_ = REG_EXPAND_SZ;
-    wchar_t saved_[MAX_PATH] = {0};
-    bool hadValue_ = false;
-};
-
 TEST(Log, UnknownDocumentsFolderMeansNoLogAndTheLaunchCompletes) {
     bed::ResetLog();
     std::wstring app = bed::MakeAppDir();
     bed::RunResult run;
     {
-        UnreachableDocuments documents;
+        // Below a file: the folder can neither exist nor be created.
+        bed::FolderOverride documents(HKEY_CURRENT_USER, L"Personal", L"C:\\windows\\system32\\kernel32.dll\\Documents");
         wchar_t path[MAX_PATH] = {0};
         ASSERT_LT(SHGetFolderPathW(nullptr, CSIDL_PERSONAL | CSIDL_FLAG_CREATE, nullptr, 0, path), 0)
             << "the prefix still resolves the documents folder: " << bed::ToUtf8(path);

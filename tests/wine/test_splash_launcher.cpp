@@ -42,37 +42,6 @@ uint32_t U32(const std::string& b, size_t at) {
            static_cast<uint32_t>(static_cast<uint8_t>(b[at + 3])) << 24;
 }
 
-struct SplashSearch {
-    DWORD pid;
-    HWND found;
-};
-
-BOOL CALLBACK FindSplash(HWND window, LPARAM param) {
-    SplashSearch* search = reinterpret_cast<SplashSearch*>(param);
-    DWORD pid = 0;
-    GetWindowThreadProcessId(window, &pid);
-    wchar_t name[64] = {0};
-    GetClassNameW(window, name, 64);
-    if (pid == search->pid && lstrcmpW(name, L"SplashScreenWndClass") == 0) {
-        search->found = window;
-        return FALSE;
-    }
-    return TRUE;
-}
-
-HWND WaitForSplash(bed::Running* running, DWORD timeoutMs) {
-    SplashSearch search{bed::ProcessId(running), nullptr};
-    bed::WaitFor([&] { EnumWindows(FindSplash, reinterpret_cast<LPARAM>(&search)); return search.found != nullptr; },
-                 timeoutMs);
-    return search.found;
-}
-
-bool InMain(const std::wstring& app) {
-    for (const std::string& line : bed::ReadRecord(app))
-        if (line.rfind("CallStaticVoidMethodV", 0) == 0) return true;
-    return false;
-}
-
 TEST(SplashPicture, IsAWholeEightBitBitmapWithItsFullColourTable) {
     Picture picture = LauncherPicture();
     ASSERT_TRUE(picture.found) << "no SPLASH resource BITMAP_SPLASH_57 in the launcher";
@@ -100,7 +69,7 @@ TEST(SplashFromOutside, CentredLayeredToolWindowFadesTo252AndLastsThroughMain) {
     std::wstring app = bed::MakeAppDir();
     bed::WriteScript(app, "main_until_file=stop.flag\n");
     bed::Running* running = bed::Start(bed::AppExe(app), bed::Quote(bed::AppExe(app)), app);
-    HWND splash = WaitForSplash(running, 10000);
+    HWND splash = bed::WaitForSplash(bed::ProcessId(running), 10000);
     if (splash == nullptr) {
         bed::Touch(app, L"stop.flag");
         bed::Finish(running);
@@ -146,7 +115,7 @@ TEST(SplashFromOutside, CentredLayeredToolWindowFadesTo252AndLastsThroughMain) {
     EXPECT_TRUE(IsWindowVisible(splash));
 
     // The Java application's main is running and the splash is still up.
-    EXPECT_TRUE(bed::WaitFor([&] { return InMain(app); }, 20000));
+    EXPECT_TRUE(bed::WaitFor([&] { return bed::RecordHas(app, "CallStaticVoidMethodV"); }, 20000));
     EXPECT_TRUE(IsWindow(splash) && IsWindowVisible(splash));
 
     // main returns: the launcher destroys the VM, shows its box, closes the splash and ends.
@@ -164,7 +133,7 @@ TEST(SplashFromOutside, GoesByItselfAfterTwentySecondsWhileMainRuns) {
     std::wstring app = bed::MakeAppDir();
     bed::WriteScript(app, "main_until_file=stop.flag\n");
     bed::Running* running = bed::Start(bed::AppExe(app), bed::Quote(bed::AppExe(app)), app);
-    HWND splash = WaitForSplash(running, 10000);
+    HWND splash = bed::WaitForSplash(bed::ProcessId(running), 10000);
     DWORD appeared = GetTickCount();
     bool gone = splash != nullptr && bed::WaitFor([&] { return !IsWindow(splash); }, 25000);
     DWORD shown = GetTickCount() - appeared;
@@ -177,7 +146,7 @@ TEST(SplashFromOutside, GoesByItselfAfterTwentySecondsWhileMainRuns) {
     EXPECT_GE(shown, 19000u);
     EXPECT_LE(shown, 22000u);
     EXPECT_TRUE(launcherRunning) << "the splash went with the launcher, not by its display time";
-    EXPECT_TRUE(InMain(app));
+    EXPECT_TRUE(bed::RecordHas(app, "CallStaticVoidMethodV"));
     EXPECT_EQ(run.exitCode, 0u);
 }
 

@@ -76,21 +76,6 @@ TEST(Startup, ApplicationDirectoryBecomesCurrentFromAnyWorkingDirectory) {
     EXPECT_EQ(record.back(), "DestroyJavaVM");
 }
 
-// The splash window of a running launcher, if any.
-struct SplashSearch {
-    DWORD pid;
-    bool found;
-};
-BOOL CALLBACK FindSplash(HWND window, LPARAM param) {
-    SplashSearch* search = reinterpret_cast<SplashSearch*>(param);
-    DWORD pid = 0;
-    GetWindowThreadProcessId(window, &pid);
-    wchar_t name[64] = {0};
-    GetClassNameW(window, name, 64);
-    if (pid == search->pid && lstrcmpW(name, L"SplashScreenWndClass") == 0) search->found = true;
-    return TRUE;
-}
-
 bool SplashShownWith(const std::wstring& args) {
     bed::ResetLog();
     std::wstring app = bed::MakeAppDir();
@@ -98,20 +83,13 @@ bool SplashShownWith(const std::wstring& args) {
     std::wstring line = bed::Quote(bed::AppExe(app)) + L" " + args;
     bed::Running* running = bed::Start(bed::AppExe(app), line, app);
     // main is running once the double has recorded the call; the splash is up long before that.
-    bool inMain = bed::WaitFor(
-        [&] {
-            for (const auto& l : bed::ReadRecord(app))
-                if (l.rfind("CallStaticVoidMethodV", 0) == 0) return true;
-            return false;
-        },
-        20000);
-    SplashSearch search{bed::ProcessId(running), false};
-    if (inMain) bed::WaitFor([&] { EnumWindows(FindSplash, reinterpret_cast<LPARAM>(&search)); return search.found; }, 1000);
+    bool inMain = bed::WaitFor([&] { return bed::RecordHas(app, "CallStaticVoidMethodV"); }, 20000);
+    bool shown = inMain && bed::WaitForSplash(bed::ProcessId(running), 1000) != nullptr;
     bed::Touch(app, L"stop.flag");
     bed::RunResult run = bed::Finish(running);
     EXPECT_TRUE(inMain);
     EXPECT_EQ(run.exitCode, 0u);
-    return search.found;
+    return shown;
 }
 
 TEST(Startup, NoSplashFirstInAnyLetterCaseSuppressesTheSplash) {

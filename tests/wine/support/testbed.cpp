@@ -5,7 +5,7 @@
 #include <shlwapi.h>
 
 #include <atomic>
-#include <set>
+#include <map>
 #include <thread>
 
 namespace bed {
@@ -114,6 +114,12 @@ std::vector<std::string> ReadRecord(const std::wstring& appDir) {
     return lines;
 }
 
+bool RecordHas(const std::wstring& appDir, const char* prefix) {
+    for (const std::string& line : ReadRecord(appDir))
+        if (line.rfind(prefix, 0) == 0) return true;
+    return false;
+}
+
 void Touch(const std::wstring& appDir, const wchar_t* name) { WriteFileBytes(appDir + L"\\" + name, "x"); }
 
 // ---- Running programs.
@@ -163,7 +169,10 @@ MessageBoxInfo ReadBox(HWND box) {
 }
 
 void WatchBoxes(Running* running) {
-    std::set<HWND> handled;
+    // Boxes already read, with the time the dismissal was last posted. A box that is still there
+    // half a second later is asked again: a dismissal posted while the box was still setting
+    // itself up may be lost.
+    std::map<HWND, DWORD> handled;
     for (;;) {
         bool ended = WaitForSingleObject(running->process.hProcess, 0) == WAIT_OBJECT_0;
         BoxScan scan{running, {}};
@@ -175,10 +184,20 @@ void WatchBoxes(Running* running) {
             MessageBoxInfo info = ReadBox(box);
             running->boxes.push_back(info);
             if (running->options.onBox) running->options.onBox(info, box);
-            handled.insert(box);
+            handled[box] = GetTickCount();
             if (running->options.dismissBoxes) PostMessageW(box, WM_COMMAND, IDOK, 0);
         }
-        for (auto it = handled.begin(); it != handled.end();) it = IsWindow(*it) ? std::next(it) : handled.erase(it);
+        for (auto it = handled.begin(); it != handled.end();) {
+            if (!IsWindow(it->first)) {
+                it = handled.erase(it);
+                continue;
+            }
+            if (running->options.dismissBoxes && GetTickCount() - it->second > 500) {
+                PostMessageW(it->first, WM_COMMAND, IDOK, 0);
+                it->second = GetTickCount();
+            }
+            ++it;
+        }
         if (ended || running->stop) return;
         Sleep(10);
     }
@@ -286,6 +305,78 @@ RunResult RunLauncher(const std::wstring& appDir, const std::wstring& args, cons
     std::wstring line = Quote(AppExe(appDir));
     if (!args.empty()) line += L" " + args;
     return Run(AppExe(appDir), line, appDir, options);
+}
+
+// ---- Special folders.
+
+static const wchar_t kShellFolders[] = L"Software\\Microsoft\\Windows\\CurrentVersion\\Explorer\\User Shell Folders";
+
+FolderOverride::FolderOverride(HKEY root, const wchar_t* value, const std::wstring& path) : root_(root), value_(value) {
+    const REGSAM views[] = {KEY_WOW64_64KEY, KEY_WOW64_32KEY};
+    for (REGSAM view : views) {
+        Saved saved;
+        saved.view = view;
+        HKEY key = nullptr;
+        if (RegCreateKeyExW(root_, kShellFolders, 0, nullptr, 0, KEY_QUERY_VALUE | KEY_SET_VALUE | view, nullptr, &key,
+                            nullptr) != ERROR_SUCCESS)
+            continue;
+        DWORD size = 0;
+        if (RegQueryValueExW(key, value_, nullptr, &saved.type, nullptr, &size) == ERROR_SUCCESS) {
+            saved.existed = true;
+            saved.data.resize(size);
+            RegQueryValueExW(key, value_, nullptr, &saved.type, saved.data.data(), &size);
+        }
+        RegSetValueExW(key, value_, 0, REG_EXPAND_SZ, reinterpret_cast<const BYTE*>(path.c_str()),
+                       static_cast<DWORD>((path.size() + 1) * sizeof(wchar_t)));
+        RegCloseKey(key);
+        saved_.push_back(saved);
+    }
+}
+
+FolderOverride::~FolderOverride() {
+    // Last saved first: where both views are one key, the first saving holds the original.
+    for (auto it = saved_.rbegin(); it != saved_.rend(); ++it) {
+        const Saved& saved = *it;
+        HKEY key = nullptr;
+        if (RegOpenKeyExW(root_, kShellFolders, 0, KEY_SET_VALUE | saved.view, &key) != ERROR_SUCCESS) continue;
+        if (saved.existed)
+            RegSetValueExW(key, value_, 0, saved.type, saved.data.data(), static_cast<DWORD>(saved.data.size()));
+        else
+            RegDeleteValueW(key, value_);
+        RegCloseKey(key);
+    }
+}
+
+// ---- Windows of other processes.
+
+namespace {
+struct WindowSearch {
+    DWORD pid;
+    const wchar_t* className;
+    HWND found;
+};
+BOOL CALLBACK MatchProcessWindow(HWND window, LPARAM param) {
+    WindowSearch* search = reinterpret_cast<WindowSearch*>(param);
+    DWORD pid = 0;
+    GetWindowThreadProcessId(window, &pid);
+    wchar_t name[256] = {0};
+    GetClassNameW(window, name, 256);
+    if (pid != search->pid || lstrcmpW(name, search->className) != 0) return TRUE;
+    search->found = window;
+    return FALSE;
+}
+}  // namespace
+
+HWND FindProcessWindow(DWORD pid, const wchar_t* className) {
+    WindowSearch search{pid, className, nullptr};
+    EnumWindows(MatchProcessWindow, reinterpret_cast<LPARAM>(&search));
+    return search.found;
+}
+
+HWND WaitForSplash(DWORD pid, DWORD timeoutMs) {
+    HWND splash = nullptr;
+    WaitFor([&] { return (splash = FindProcessWindow(pid, L"SplashScreenWndClass")) != nullptr; }, timeoutMs);
+    return splash;
 }
 
 // ---- The log.

@@ -36,6 +36,8 @@ void WriteScript(const std::wstring& appDir, const std::string& script);
 // The double's record (appDir\vmdouble.log), one entry per line, without line ends. Empty when the
 // double never ran.
 std::vector<std::string> ReadRecord(const std::wstring& appDir);
+// True when a line of the record starts with `prefix` (e.g. "CallStaticVoidMethodV": main runs).
+bool RecordHas(const std::wstring& appDir, const char* prefix);
 // Creates appDir\<name> (the double's "main_until_file" waits for it).
 void Touch(const std::wstring& appDir, const wchar_t* name);
 
@@ -79,6 +81,36 @@ RunResult Run(const std::wstring& application, const std::wstring& commandLine, 
 RunResult RunLauncher(const std::wstring& appDir, const std::wstring& args = L"",
                       const RunOptions& options = RunOptions());
 std::wstring Quote(const std::wstring& text);  // "text" with the command-line quoting rules
+
+// ---- Special folders.
+// Points a special folder of the prefix elsewhere through "User Shell Folders" (both registry
+// views, as the launcher may be 32- or 64-bit) and puts the previous values back when it goes.
+// `root` HKEY_CURRENT_USER with "Personal" (documents) or "AppData", or HKEY_LOCAL_MACHINE with
+// "Common AppData".
+class FolderOverride {
+public:
+    FolderOverride(HKEY root, const wchar_t* value, const std::wstring& path);
+    ~FolderOverride();
+    FolderOverride(const FolderOverride&) = delete;
+    FolderOverride& operator=(const FolderOverride&) = delete;
+
+private:
+    struct Saved {
+        REGSAM view = 0;
+        bool existed = false;
+        DWORD type = 0;
+        std::vector<BYTE> data;
+    };
+    HKEY root_;
+    const wchar_t* value_;
+    std::vector<Saved> saved_;
+};
+
+// ---- Windows of other processes.
+// A top-level window of process `pid` with the class `className`, or null.
+HWND FindProcessWindow(DWORD pid, const wchar_t* className);
+// The splash window of process `pid`, waiting up to `timeoutMs` for it; null when none came.
+HWND WaitForSplash(DWORD pid, DWORD timeoutMs);
 
 // ---- The log.
 std::wstring DocumentsDir();
