@@ -1,17 +1,17 @@
 #!/usr/bin/env python3
-"""Writes the bitmap file images the splash module tests show: make_variants.py OUTPUT_DIR
+"""Writes the bitmap file images the splash module tests show: make_variants.py OUTPUT_DIR [W H]
 
 The drawable ones are 300 x 200 and split into quadrants of four plain colours (top left red, top
 right green, bottom left blue, bottom right yellow; the 1-bit one has only two: red above, blue
 below), so a test can tell where the picture landed and which way up. The palette pictures carry
 their colours at the end of a full table, and bfOffBits is 0: the splash must find the pixels
-behind the full table by itself.
+behind the full table by itself. A smaller W x H gives seeds for the fuzz target.
 """
 import os
 import struct
 import sys
 
-W, H = 300, 200
+W, H = (int(sys.argv[2]), int(sys.argv[3])) if len(sys.argv) == 4 else (300, 200)
 RED, GREEN, BLUE, YELLOW = (192, 48, 48), (48, 192, 48), (48, 48, 192), (192, 192, 48)
 MAGENTA = (255, 0, 255)  # what a 16- or 32-bit picture would show if it were drawn
 
@@ -76,15 +76,13 @@ def make_all():
 
     out["not_bm.bmp"] = b"XM" + out["v24.bmp"][2:]
     whole8 = out["v8.bmp"]
-    out["truncated.bmp"] = whole8[:len(whole8) - 100 * W]  # half of the rows are missing
-    out["headers_cut.bmp"] = out["v24.bmp"][:40]  # not even the info header
-    out["empty.bmp"] = b""
+    out["truncated.bmp"] = whole8[:-(H // 2) * W]  # about half of the rows are missing
     return out
 
 
 def main():
-    if len(sys.argv) != 2:
-        sys.exit("usage: make_variants.py OUTPUT_DIR")
+    if len(sys.argv) not in (2, 4):
+        sys.exit("usage: make_variants.py OUTPUT_DIR [WIDTH HEIGHT]")
     os.makedirs(sys.argv[1], exist_ok=True)
     for name, data in make_all().items():
         with open(os.path.join(sys.argv[1], name), "wb") as f:

@@ -11,14 +11,11 @@ set -u
 bed=$1 state=$2 launcher=$3 vmdouble=$4 picture=$5 out=$6
 fail() { echo "FAIL: $*" >&2; exit 1; }
 
-for tool in import convert compare identify; do
-  command -v "$tool" >/dev/null || fail "ImageMagick's $tool is missing"
-done
+command -v compare >/dev/null || fail "ImageMagick is missing"
 # shellcheck disable=SC1090
 . <("$bed" env "$state") || fail "no test bed at $state"
 pgrep -x xcompmgr >/dev/null || echo "note: no xcompmgr process seen; the capture shows the splash opaque" >&2
 
-mkdir -p "$out"
 app=$out/screenshot-app
 rm -rf "$app"
 mkdir -p "$app/jre/bin/client"
@@ -38,11 +35,9 @@ finish() {
 trap finish EXIT
 
 # The splash starts before the VM; once main runs, the window is up. Then let the fade finish.
-for _ in $(seq 300); do
-  grep -q '^CallStaticVoidMethodV' "$app/vmdouble.log" 2>/dev/null && break
-  sleep 0.1
-done
-grep -q '^CallStaticVoidMethodV' "$app/vmdouble.log" 2>/dev/null || fail "the launcher never reached main"
+in_main() { grep -q '^CallStaticVoidMethodV' "$app/vmdouble.log" 2>/dev/null; }
+for _ in $(seq 300); do in_main && break; sleep 0.1; done
+in_main || fail "the launcher never reached main"
 sleep 1.5
 
 import -window root "$out/screen.png" || fail "no screenshot"
