@@ -18,30 +18,11 @@ std::string Encode(const std::u16string& text) {
     return out;
 }
 
-struct OwnedBuffer {
-    EncodeBuffer buffer = {nullptr, 0};
-    ~OwnedBuffer() { free(buffer.text); }
-    std::string Put(const std::u16string& text) {
-        EXPECT_TRUE(EncodeArgumentInto(text.c_str(), &buffer));
-        return buffer.text;
-    }
-};
-
-TEST(EncodeArgument, ProductExamples) {
+TEST(EncodeArgument, ProductExamplesAndEveryUnitValue) {
     EXPECT_EQ(Encode(u"-noSplash"), "002d006e006f00530070006c006100730068");
     EXPECT_EQ(Encode(u"C:\\M\u00fcll"), "0043003a005c004d00fc006c006c");
     EXPECT_EQ(Encode(u"a b"), "006100200062");
     EXPECT_EQ(Encode(u"\U0001F600"), "d83dde00");  // each surrogate by itself
-}
-
-TEST(EncodeArgument, DigitsAreLowerCaseWhateverTheInput) {
-    EXPECT_EQ(Encode(u"ABCDEF"), "004100420043004400450046");
-    EXPECT_EQ(Encode(u"\uABCD\uFFFF\u00FF"), "abcdffff00ff");
-    // A lone surrogate is a unit like any other.
-    EXPECT_EQ(Encode(u"\xDC00x"), "dc000078");
-}
-
-TEST(EncodeArgument, EveryUnitValueRoundTrips) {
     std::u16string all;
     for (unsigned u = 1; u <= 0xFFFF; ++u) all.push_back(static_cast<char16_t>(u));
     std::string encoded = Encode(all);
@@ -51,36 +32,27 @@ TEST(EncodeArgument, EveryUnitValueRoundTrips) {
         ASSERT_EQ(group.find_first_not_of("0123456789abcdef"), std::string::npos) << group;
         ASSERT_EQ(strtoul(group.c_str(), nullptr, 16), all[i]) << "unit " << i;
     }
-}
-
-TEST(EncodeArgument, EmptyTextLeavesTheBufferAlone) {
+    // An empty text leaves the output alone.
     char out[8] = "keepme";
     EncodeArgument(u"", out);
     EXPECT_STREQ(out, "keepme");
 }
 
-TEST(EncodeArgumentInto, EmptyFirstArgumentIsEmptyAndLaterOnesRepeat) {
-    OwnedBuffer b;
-    EXPECT_EQ(b.Put(u""), "");
-    EXPECT_EQ(b.Put(u"ab"), "00610062");
-    EXPECT_EQ(b.Put(u""), "00610062");
-    // A shorter argument after a longer one is not followed by the old tail.
-    EXPECT_EQ(b.Put(u"c"), "0063");
-}
-
-TEST(EncodeArgumentInto, LongArgumentsAreEncodedWhole) {
-    for (size_t units : {1023u, 1024u, 5000u, 32767u}) {
-        std::u16string text;
-        for (size_t i = 0; i < units; ++i) text.push_back(static_cast<char16_t>(0x4E00 + i % 200));
-        OwnedBuffer b;
-        b.Put(u"x");
-        std::string encoded = b.Put(text);
-        ASSERT_EQ(encoded.size(), 4 * units);
-        EXPECT_EQ(encoded, Encode(text));
-        EXPECT_GE(b.buffer.capacity, 4 * units + 1);
-        // Growing keeps serving: an empty argument repeats the long encoding.
-        EXPECT_EQ(b.Put(u""), encoded);
-    }
+TEST(EncodeArgumentInto, EmptyRepeatsThePreviousTextAndLongTextsGrowTheBuffer) {
+    EncodeBuffer b = {nullptr, 0};
+    auto put = [&b](const std::u16string& text) {
+        EXPECT_TRUE(EncodeArgumentInto(text.c_str(), &b));
+        return std::string(b.text);
+    };
+    EXPECT_EQ(put(u""), "");  // first in place: empty
+    EXPECT_EQ(put(u"ab"), "00610062");
+    EXPECT_EQ(put(u""), "00610062");
+    EXPECT_EQ(put(u"c"), "0063");  // no old tail after a shorter one
+    std::u16string text(32767, u'\u4E2D');
+    EXPECT_EQ(put(text), Encode(text));
+    EXPECT_GE(b.capacity, 4 * text.size() + 1);
+    EXPECT_EQ(put(u"").size(), 4 * text.size());
+    free(b.text);
 }
 
 }  // namespace

@@ -1,9 +1,6 @@
 // What the VM option list makes of inputs the Windows tests cannot easily produce: a drive-root
-// directory, a directory whose conversion failed, overlong values; and the byte-wise narrowing of
-// the special folders. (The full lists are checked under Wine and against the real VM.)
+// directory, a directory whose conversion failed, overlong values, a folder buffer without end.
 #include <gtest/gtest.h>
-
-#include <string.h>
 
 #include <string>
 #include <vector>
@@ -48,16 +45,11 @@ TEST(ComposeVmOptions, DirectoryForms) {
     EXPECT_EQ(options[6].size(), 1023u);
 }
 
-TEST(NarrowLowBytes, TakesTheLowByteOfEveryUnit) {
-    char16_t folder[kFolderPathUnits] = {};
-    std::u16string path = u"C:\\M\u00fcll\\\u4E2D\u0141";  // U+4E2D -> '-', U+0141 -> 'A'
-    memcpy(folder, path.data(), path.size() * 2);
+// (The low-byte narrowing itself is checked under Wine through the prefix's folders.)
+TEST(NarrowLowBytes, FullBufferWithoutTerminatorIsCutAfter260Bytes) {
+    char16_t folder[kFolderPathUnits];
+    for (char16_t& u : folder) u = u'\u017a';  // low byte 'z'
     char out[kFolderPathUnits + 1];
-    NarrowLowBytes(folder, out);
-    EXPECT_EQ(std::string(out), "C:\\M\xfcll\\-A");
-
-    // A full buffer without terminator is still terminated after 260 bytes.
-    for (char16_t& u : folder) u = u'z';
     NarrowLowBytes(folder, out);
     EXPECT_EQ(std::string(out), std::string(kFolderPathUnits, 'z'));
 }

@@ -1,207 +1,144 @@
-// A second start raises the running application's frame: windows opened by the VM double inside the
-// first instance, looked at from here before and after the second instance ran.
+// A second start raises the running application's frame: windows opened by the VM double inside
+// the first instance, looked at from here before and after the second instance ran.
 #include "test_instance_support.h"
 
 #include <gtest/gtest.h>
 
-using handoff::FirstGuard;
-using handoff::FirstInstance;
-using handoff::Listener;
+#include <map>
+
+using handoff::Pump;
 
 namespace {
 
-LRESULT CALLBACK FrontWindowProc(HWND window, UINT message, WPARAM wParam, LPARAM lParam) {
-    return DefWindowProcW(window, message, wParam, lParam);
-}
-
-void Pump() {
-    MSG message;
-    while (PeekMessageW(&message, nullptr, 0, 0, PM_REMOVE)) DispatchMessageW(&message);
-}
-
-bool WaitPumping(bool (*condition)(HWND), HWND window, DWORD timeoutMs) {
-    DWORD start = GetTickCount();
-    for (;;) {
+bool WaitForeground(HWND window, DWORD timeoutMs) {
+    for (DWORD start = GetTickCount();; Sleep(10)) {
         Pump();
-        if (condition(window)) return true;
+        if (GetForegroundWindow() == window) return true;
         if (GetTickCount() - start >= timeoutMs) return false;
-        Sleep(10);
     }
 }
 
-bool IsForeground(HWND window) { return GetForegroundWindow() == window; }
-
 // A window of this process in front, so that the activation has something to take the front from
 // (a minimised window may be the foreground window, so the starting point must be known).
-HWND TakeFront() {
-    WNDCLASSW windowClass = {};
-    windowClass.lpfnWndProc = FrontWindowProc;
-    windowClass.hInstance = GetModuleHandleW(nullptr);
-    windowClass.lpszClassName = L"InstanceTestFront";
-    RegisterClassW(&windowClass);
-    HWND window = CreateWindowExW(0, L"InstanceTestFront", L"front", WS_OVERLAPPEDWINDOW | WS_VISIBLE, 20, 20, 240,
-                                  120, nullptr, nullptr, GetModuleHandleW(nullptr), nullptr);
-    SetForegroundWindow(window);
-    WaitPumping(IsForeground, window, 5000);
-    return window;
-}
-
 struct FrontWindow {
-    HWND window = TakeFront();
+    HWND window;
+    FrontWindow() {
+        WNDCLASSW windowClass = {};
+        windowClass.lpfnWndProc = DefWindowProcW;
+        windowClass.hInstance = GetModuleHandleW(nullptr);
+        windowClass.lpszClassName = L"InstanceTestFront";
+        RegisterClassW(&windowClass);
+        window = CreateWindowExW(0, L"InstanceTestFront", L"front", WS_OVERLAPPEDWINDOW | WS_VISIBLE, 20, 20, 240, 120,
+                                 nullptr, nullptr, GetModuleHandleW(nullptr), nullptr);
+        SetForegroundWindow(window);
+        WaitForeground(window, 5000);
+    }
     ~FrontWindow() {
         DestroyWindow(window);
         Pump();
     }
 };
 
-// A scripted window: its window= line and the key under which it is found again.
+// A window the VM double opens minimised: "CLASS|TITLEHEX" is also the key it is found by.
 struct Scripted {
-    const char* visible;
-    const char* minimised;
-    std::string className;
-    std::string title;
+    bool visible;
+    std::string key;
     std::string Line() const {
-        return std::string("window=") + visible + "," + minimised + "," + className + "," + title + "\n";
+        std::string line = key;
+        line[line.find('|')] = ',';
+        return std::string("window=") + (visible ? "1" : "0") + ",1," + line + "\n";
     }
-    std::string Key() const { return className + "|" + title; }
 };
 
-std::string ScriptOf(const std::vector<Scripted>& windows) {
-    std::string script;
-    for (const Scripted& w : windows) script += w.Line();
-    return script;
+std::string KeyOf(HWND window) {
+    wchar_t className[256] = {0}, title[1024] = {0};
+    GetClassNameW(window, className, 256);
+    GetWindowTextW(window, title, 1024);
+    return bed::ToUtf8(className) + "|" + handoff::Hex(title);
 }
 
-// The scripted windows of the first instance (other windows the platform keeps for a process are
-// ignored), in enumeration order; waits until all of them exist.
-std::vector<HWND> FindScripted(DWORD processId, const std::vector<Scripted>& scripted) {
-    std::vector<HWND> found;
+struct Scan {
+    DWORD processId;
+    std::vector<HWND> windows;
+};
+BOOL CALLBACK Collect(HWND window, LPARAM param) {
+    Scan* scan = reinterpret_cast<Scan*>(param);
+    DWORD owner = 0;
+    GetWindowThreadProcessId(window, &owner);
+    if (owner == scan->processId) scan->windows.push_back(window);
+    return TRUE;
+}
+
+// The scripted windows of process `pid` by key, and their keys in enumeration order (other
+// windows the platform keeps for a process are ignored); waits until all of them exist.
+std::map<std::string, HWND> FindScripted(DWORD pid, const std::vector<Scripted>& scripted, std::vector<std::string>* order) {
+    std::map<std::string, HWND> found;
     bed::WaitFor(
         [&] {
+            Scan scan = {pid, {}};
+            EnumWindows(Collect, reinterpret_cast<LPARAM>(&scan));
             found.clear();
-            for (HWND window : handoff::WindowsOf(processId)) {
-                std::string key = handoff::KeyOf(window);
+            order->clear();
+            for (HWND window : scan.windows)
                 for (const Scripted& w : scripted)
-                    if (w.Key() == key) found.push_back(window);
-            }
+                    if (w.key == KeyOf(window)) {
+                        found[w.key] = window;
+                        order->push_back(w.key);
+                    }
             return found.size() == scripted.size();
         },
         15000);
     return found;
 }
 
-HWND Find(const std::vector<HWND>& windows, const Scripted& w) {
-    for (HWND window : windows)
-        if (handoff::KeyOf(window) == w.Key()) return window;
-    return nullptr;
-}
-
-// The second instance with a listener in place, so that the hand-off does not wait for one.
-void RunSecondInstance() {
-    std::wstring secondDir = bed::MakeAppDir();
-    Listener listener;
-    ASSERT_TRUE(listener.Start());
-    bed::RunResult second = handoff::RunSecond(secondDir, L"");
-    listener.Finish();
-    EXPECT_EQ(second.exitCode, 0u);
-    EXPECT_EQ(listener.received, "002d006e");
-    Pump();
-}
-
-const std::string kFrame = handoff::kFrameClass;
-const std::string kLock = handoff::kLockNameHex;
-
-// Only a visible window whose title bytes hold the instance name before their first zero byte and
-// whose class is the frame class is restored and raised; every near miss is left as it was.
-TEST(Activation, RaisesTheFrameAndLeavesNearMissesAlone) {
-    const Scripted frame = {"1", "1", kFrame, kLock};
-    const Scripted hidden = {"0", "1", kFrame, kLock + "3141"};
+// Only visible windows whose title bytes hold the instance name before their first zero byte and
+// whose class is the frame class in any letter case are restored and raised, every one of them,
+// so the one enumerated later ends in front; every near miss is left as it was.
+TEST(Activation, RaisesQualifyingFramesAndLeavesNearMissesAlone) {
+    // The frame class in another letter case (one process cannot have both spellings: the first
+    // registration wins).
+    const std::string frame = "COM.QZ.KPO.EMU57.APP.EMULATORFRAME", lock = handoff::Hex(handoff::kLockName);
+    const std::vector<Scripted> qualifying = {{true, frame + "|" + lock}, {true, frame + "|5858" + lock}};
     const std::vector<Scripted> nearMisses = {
-        {"1", "1", kFrame, "7a71" + kLock.substr(4)},                  // "qz-Lumiscope_QZ-57"
-        {"1", "1", kFrame, handoff::Hex(handoff::kReadableName)},      // readable name, one byte per unit
-        {"1", "1", kFrame, "0041" + kLock},                            // 'A' first: the search stops at its 00
-        {"1", "1", kFrame, ""},                                        // untitled
-        {"1", "1", kFrame + "X", kLock + "3241"},                      // right title, longer class
-        {"1", "1", kFrame.substr(0, kFrame.size() - 1), kLock + "3341"},  // right title, shorter class
+        {false, frame + "|" + lock + "3141"},                               // hidden
+        {true, frame + "|7a71" + lock.substr(4)},                           // "qz-Lumiscope_QZ-57"
+        {true, frame + "|" + handoff::Hex(handoff::kReadableName)},         // one byte per unit
+        {true, frame + "|0041" + lock},                                     // the search stops at 'A''s 00
+        {true, frame + "|"},                                                // untitled
+        {true, frame + "X|" + lock + "3241"},                               // right title, longer class
+        {true, frame.substr(0, frame.size() - 1) + "|" + lock + "3341"},    // right title, shorter class
     };
-    std::vector<Scripted> all = {frame, hidden};
+    std::vector<Scripted> all = qualifying;
     all.insert(all.end(), nearMisses.begin(), nearMisses.end());
+    std::string script;
+    for (const Scripted& w : all) script += w.Line();
 
-    FirstInstance first;
-    FirstGuard guard{&first};
-    ASSERT_TRUE(handoff::StartFirst(&first, ScriptOf(all)));
-    std::vector<HWND> windows = FindScripted(bed::ProcessId(first.running), all);
+    handoff::FirstInstance first;
+    ASSERT_TRUE(first.Start(script));
+    std::vector<std::string> order;
+    std::map<std::string, HWND> windows = FindScripted(bed::ProcessId(first.running), all, &order);
     ASSERT_EQ(windows.size(), all.size());
-    for (HWND window : windows) ASSERT_TRUE(IsIconic(window)) << handoff::KeyOf(window);
-    ASSERT_FALSE(IsWindowVisible(Find(windows, hidden)));
-
+    for (const auto& w : windows) ASSERT_TRUE(IsIconic(w.second)) << w.first;
     FrontWindow front;
-    ASSERT_TRUE(IsForeground(front.window));
-    RunSecondInstance();
+    ASSERT_EQ(GetForegroundWindow(), front.window);
 
-    HWND frameWindow = Find(windows, frame);
-    EXPECT_TRUE(WaitPumping(IsForeground, frameWindow, 5000));
-    EXPECT_FALSE(IsIconic(frameWindow));
-    EXPECT_FALSE(IsWindowVisible(Find(windows, hidden)));
-    EXPECT_TRUE(IsIconic(Find(windows, hidden)));
-    for (const Scripted& w : nearMisses) {
-        SCOPED_TRACE(w.Key());
-        EXPECT_TRUE(IsIconic(Find(windows, w)));
-        EXPECT_NE(GetForegroundWindow(), Find(windows, w));
+    handoff::Listener listener;  // so that the hand-off does not wait for one
+    ASSERT_TRUE(listener.Start());
+    EXPECT_EQ(handoff::RunSecond(bed::MakeAppDir(), L"").exitCode, 0u);
+    listener.Finish();
+
+    std::string later;
+    for (const std::string& key : order)
+        if (key == qualifying[0].key || key == qualifying[1].key) later = key;
+    EXPECT_TRUE(WaitForeground(windows[later], 5000)) << KeyOf(GetForegroundWindow());
+    for (const Scripted& w : qualifying) {
+        EXPECT_FALSE(IsIconic(windows[w.key])) << w.key;
+        EXPECT_FALSE(IsZoomed(windows[w.key])) << w.key;
     }
-    EXPECT_EQ(handoff::StopFirst(&first).exitCode, 0u);
-}
-
-// The class name is compared without regard to letter case, the name may sit anywhere before the
-// first zero byte of the title, and every qualifying window is treated: both are restored and the
-// one enumerated later ends in front.
-TEST(Activation, TwoQualifyingWindowsBothRestoredLaterInFront) {
-    const std::string upperClass = "COM.QZ.KPO.EMU57.APP.EMULATORFRAME";
-    const std::vector<Scripted> both = {{"1", "1", upperClass, "5858" + kLock}, {"1", "1", upperClass, kLock + "3141"}};
-    FirstInstance first;
-    FirstGuard guard{&first};
-    ASSERT_TRUE(handoff::StartFirst(&first, ScriptOf(both)));
-    DWORD pid = bed::ProcessId(first.running);
-    ASSERT_EQ(FindScripted(pid, both).size(), 2u);
-
-    FrontWindow front;
-    ASSERT_TRUE(IsForeground(front.window));
-    std::vector<HWND> order = FindScripted(pid, both);
-    ASSERT_EQ(order.size(), 2u);
-    ASSERT_TRUE(IsIconic(order[0]));
-    ASSERT_TRUE(IsIconic(order[1]));
-
-    RunSecondInstance();
-
-    EXPECT_TRUE(WaitPumping(IsForeground, order[1], 5000)) << handoff::KeyOf(GetForegroundWindow());
-    EXPECT_FALSE(IsIconic(order[0]));
-    EXPECT_FALSE(IsIconic(order[1]));
-    EXPECT_EQ(handoff::StopFirst(&first).exitCode, 0u);
-}
-
-// A frame that is not minimised is only brought to the front.
-TEST(Activation, FrameNotMinimisedIsBroughtToFront) {
-    const std::vector<Scripted> one = {{"1", "0", kFrame, kLock}};
-    FirstInstance first;
-    FirstGuard guard{&first};
-    ASSERT_TRUE(handoff::StartFirst(&first, ScriptOf(one)));
-    std::vector<HWND> windows = FindScripted(bed::ProcessId(first.running), one);
-    ASSERT_EQ(windows.size(), 1u);
-    HWND frame = windows[0];
-    RECT before;
-    GetWindowRect(frame, &before);
-
-    FrontWindow front;
-    ASSERT_TRUE(IsForeground(front.window));
-    RunSecondInstance();
-
-    EXPECT_TRUE(WaitPumping(IsForeground, frame, 5000));
-    EXPECT_TRUE(IsWindowVisible(frame));
-    EXPECT_FALSE(IsIconic(frame));
-    RECT after;
-    GetWindowRect(frame, &after);
-    EXPECT_TRUE(EqualRect(&before, &after));
-    EXPECT_EQ(handoff::StopFirst(&first).exitCode, 0u);
+    for (const Scripted& w : nearMisses) {
+        EXPECT_TRUE(IsIconic(windows[w.key])) << w.key;
+        EXPECT_EQ(IsWindowVisible(windows[w.key]) != FALSE, w.visible) << w.key;
+    }
 }
 
 }  // namespace

@@ -1,147 +1,101 @@
-// The VM option list as the VM double receives it: the fixed options, "-noSplash" once per
-// matching argument, and the two special-folder options as the prefix's folders allow, each byte
-// of each option checked.
+// The VM option list as the VM double receives it, byte for byte: the fixed options, "-noSplash"
+// once per matching argument, and the two special-folder options as the prefix's folders allow.
 #include <gtest/gtest.h>
+#include <shlobj.h>
 
-#include "support/expect.h"
 #include "support/testbed.h"
 #include "test_jvm_support.h"
 
 namespace {
 
-using jvmtest::FixedOptions;
+const char kNoSplash[] = "-Dapp.lumiscope57.noSplash=true";
 
-struct Launch {
-    std::wstring app;
-    bed::RunResult run;
-    jvmtest::Record record;
-};
-
-Launch RunWith(const std::wstring& args, const std::wstring& app = bed::MakeAppDir()) {
-    Launch launch;
-    launch.app = app;
-    launch.run = bed::RunLauncher(app, args);
-    launch.record = jvmtest::ReadRecord(app);
-    EXPECT_FALSE(launch.run.timedOut);
-    EXPECT_EQ(launch.run.exitCode, 0u);
-    EXPECT_EQ(launch.record.createLine, jvmtest::CreateLine(launch.record.options.size()));
-    return launch;
+std::vector<std::string> OptionsOf(const std::wstring& app, const std::wstring& commandLine) {
+    bed::RunResult run = bed::Run(bed::AppExe(app), commandLine, app);
+    EXPECT_FALSE(run.timedOut);
+    EXPECT_EQ(run.exitCode, 0u);
+    return jvmtest::ReadRecord(app).options;
 }
 
-std::string AppDataOption() { return "-Duser.appdata.path=" + bed::ToUtf8(jvmtest::Folder(CSIDL_APPDATA)); }
-std::string TempOption() { return "-Duser.temp.path=" + bed::ToUtf8(jvmtest::Folder(CSIDL_APPDATA)); }
-
-std::vector<std::string> Concat(std::vector<std::string> head, const std::vector<std::string>& tail) {
-    head.insert(head.end(), tail.begin(), tail.end());
-    return head;
+std::wstring LauncherLine(const std::wstring& app, const std::wstring& args) {
+    return bed::Quote(bed::AppExe(app)) + L" " + args;
 }
 
-TEST(VmOptions, WithoutTheSwitch) {
-    Launch launch = RunWith(L"file.qz57");
-    EXPECT_EQ(launch.record.options, Concat(FixedOptions(bed::ToUtf8(launch.app)), {AppDataOption(), TempOption()}));
-    EXPECT_EQ(launch.record.calls.back(), "DestroyJavaVM");
+std::vector<std::string> Expected(const std::string& app, const std::vector<std::string>& tail) {
+    std::vector<std::string> options = jvmtest::FixedOptions(app);
+    options.insert(options.end(), tail.begin(), tail.end());
+    return options;
 }
 
-struct SwitchCase {
-    const wchar_t* args;
-    size_t times;
-};
+// Both folder options as the prefix's own folders give them (the temp path is the per-user one).
+std::vector<std::string> DefaultFolders() {
+    wchar_t path[MAX_PATH] = {0};
+    SHGetFolderPathW(nullptr, CSIDL_APPDATA, nullptr, SHGFP_TYPE_CURRENT, path);
+    return {"-Duser.appdata.path=" + bed::ToUtf8(path), "-Duser.temp.path=" + bed::ToUtf8(path)};
+}
 
 TEST(VmOptions, NoSplashOncePerMatchingArgumentInAnyCase) {
-    const SwitchCase cases[] = {
+    const struct {
+        const wchar_t* args;
+        size_t times;
+        bool wholeLine;  // args is the whole command line, argv[0] included
+    } cases[] = {
+        {L"file.qz57", 0},
         {L"-noSplash", 1},
         {L"file.qz57 -noSplash", 1},
         {L"-noSplash file.qz57 -noSplash", 2},
         {L"-NOSPLASH x -nOsPlAsH", 2},
         {L"-noSplashX noSplash --noSplash \"-noSplash \"", 0},
+        // argv[0] is scanned too; naming no directory, it leaves the working directory alone.
+        {L"-noSplash file.qz57", 1, true},
     };
-    for (const SwitchCase& c : cases) {
-        Launch launch = RunWith(c.args);
-        std::vector<std::string> expected = FixedOptions(bed::ToUtf8(launch.app));
-        expected.insert(expected.end(), c.times, jvmtest::kNoSplashOption);
-        expected.push_back(AppDataOption());
-        expected.push_back(TempOption());
-        EXPECT_EQ(launch.record.options, expected) << bed::ToUtf8(c.args);
+    for (const auto& c : cases) {
+        std::wstring app = bed::MakeAppDir();
+        std::vector<std::string> tail(c.times, kNoSplash), folders = DefaultFolders();
+        tail.insert(tail.end(), folders.begin(), folders.end());
+        std::wstring line = c.wholeLine ? c.args : LauncherLine(app, c.args);
+        EXPECT_EQ(OptionsOf(app, line), Expected(bed::ToUtf8(app), tail)) << bed::ToUtf8(line);
     }
 }
 
-TEST(VmOptions, TheExecutablesOwnArgumentIsScannedToo) {
-    // argv[0] "-noSplash" names no directory: the working directory stays the application's.
-    std::wstring app = bed::MakeAppDir();
-    bed::RunResult run = bed::Run(bed::AppExe(app), L"-noSplash file.qz57", app);
-    EXPECT_EQ(run.exitCode, 0u);
-    std::vector<std::string> expected = FixedOptions(bed::ToUtf8(app));
-    expected.push_back(jvmtest::kNoSplashOption);
-    expected.push_back(AppDataOption());
-    expected.push_back(TempOption());
-    EXPECT_EQ(jvmtest::ReadRecord(app).options, expected);
-}
-
-const wchar_t kPerUser[] = L"AppData";
-const wchar_t kAllUsers[] = L"Common AppData";
-
-TEST(VmOptions, PerUserFolderMissing) {
-    // The failed query still fills its buffer; the temp-path option must not carry that text.
-    jvmtest::FolderOverride gone(HKEY_CURRENT_USER, kPerUser, L"C:\\qz-no-such-appdata");
-    Launch launch = RunWith(L"-noSplash");
-    std::vector<std::string> expected = FixedOptions(bed::ToUtf8(launch.app));
-    expected.push_back(jvmtest::kNoSplashOption);
-    expected.push_back("-Duser.temp.path=");
-    EXPECT_EQ(launch.record.options, expected);
-}
-
-TEST(VmOptions, AllUsersFolderMissing) {
-    jvmtest::FolderOverride gone(HKEY_LOCAL_MACHINE, kAllUsers, L"C:\\qz-no-such-programdata");
-    Launch launch = RunWith(L"x");
-    EXPECT_EQ(launch.record.options, Concat(FixedOptions(bed::ToUtf8(launch.app)), {AppDataOption()}));
-}
-
-TEST(VmOptions, BothFoldersMissing) {
-    jvmtest::FolderOverride userGone(HKEY_CURRENT_USER, kPerUser, L"C:\\qz-no-such-appdata");
-    jvmtest::FolderOverride allGone(HKEY_LOCAL_MACHINE, kAllUsers, L"C:\\qz-no-such-programdata");
-    Launch launch = RunWith(L"x");
-    EXPECT_EQ(launch.record.options, FixedOptions(bed::ToUtf8(launch.app)));
-}
-
-TEST(VmOptions, FolderPathsKeepTheLowByteOfEachUnit) {
-    // U+0416 keeps 0x16, U+00E9 0xe9, U+4E2D 0x2d ('-'); U+0100 has a zero low byte and ends the text.
-    const std::wstring perUser = L"C:\\qz-\x0416\x00e9\x4e2d";
-    const std::wstring allUsers = L"C:\\qz-all-\x0416";
-    ASSERT_TRUE(CreateDirectoryW(perUser.c_str(), nullptr) || GetLastError() == ERROR_ALREADY_EXISTS);
-    ASSERT_TRUE(CreateDirectoryW(allUsers.c_str(), nullptr) || GetLastError() == ERROR_ALREADY_EXISTS);
-    {
-        jvmtest::FolderOverride user(HKEY_CURRENT_USER, kPerUser, perUser);
-        jvmtest::FolderOverride all(HKEY_LOCAL_MACHINE, kAllUsers, allUsers);
-        Launch launch = RunWith(L"x");
-        EXPECT_EQ(launch.record.options, Concat(FixedOptions(bed::ToUtf8(launch.app)),
-                                                {"-Duser.appdata.path=C:\\qz-\\x16\\xe9-", "-Duser.temp.path=C:\\qz-\\x16\\xe9-"}));
+// Each folder query failing through the prefix's registry, and the per-user path narrowed to the
+// low byte of each unit up to a zero one (U+0416 -> 0x16, U+00E9 -> 0xe9, U+4E2D -> '-', U+0100 ends
+// it). A failed query still fills its buffer: the temp path must then be empty.
+TEST(VmOptions, SpecialFolders) {
+    const std::wstring missing = L"C:\\qz-no-such-folder", user = L"C:\\qz-\x0416\x00e9\x4e2d\x0100rest";
+    const std::wstring all = L"C:\\qz-all";
+    const std::string narrowed = "C:\\qz-\\x16\\xe9-";
+    const struct {
+        const wchar_t* args;
+        std::wstring user, all;
+        std::vector<std::string> tail;
+    } cases[] = {
+        {L"-noSplash", missing, all, {kNoSplash, "-Duser.temp.path="}},
+        {L"x", user, missing, {"-Duser.appdata.path=" + narrowed}},
+        {L"x", missing, missing, {}},
+        {L"x", user, all, {"-Duser.appdata.path=" + narrowed, "-Duser.temp.path=" + narrowed}},
+    };
+    ASSERT_TRUE(CreateDirectoryW(user.c_str(), nullptr) || GetLastError() == ERROR_ALREADY_EXISTS);
+    ASSERT_TRUE(CreateDirectoryW(all.c_str(), nullptr) || GetLastError() == ERROR_ALREADY_EXISTS);
+    for (const auto& c : cases) {
+        bed::FolderOverride userFolder(HKEY_CURRENT_USER, L"AppData", c.user);
+        bed::FolderOverride allFolder(HKEY_LOCAL_MACHINE, L"Common AppData", c.all);
+        std::wstring app = bed::MakeAppDir();
+        EXPECT_EQ(OptionsOf(app, LauncherLine(app, c.args)), Expected(bed::ToUtf8(app), c.tail));
     }
-    const std::wstring cut = L"C:\\qz-\x00fc\x0100rest";
-    ASSERT_TRUE(CreateDirectoryW(cut.c_str(), nullptr) || GetLastError() == ERROR_ALREADY_EXISTS);
-    {
-        jvmtest::FolderOverride user(HKEY_CURRENT_USER, kPerUser, cut);
-        Launch launch = RunWith(L"x");
-        EXPECT_EQ(launch.record.options, Concat(FixedOptions(bed::ToUtf8(launch.app)),
-                                                {"-Duser.appdata.path=C:\\qz-\\xfc", "-Duser.temp.path=C:\\qz-\\xfc"}));
-    }
-    RemoveDirectoryW(perUser.c_str());
-    RemoveDirectoryW(allUsers.c_str());
-    RemoveDirectoryW(cut.c_str());
+    RemoveDirectoryW(user.c_str());
+    RemoveDirectoryW(all.c_str());
 }
 
 TEST(VmOptions, ApplicationDirectoryInTheAnsiCodePage) {
-    // The class and library paths are converted with the code page: characters it cannot hold
-    // arrive as its default character, those it can (U+00FC) as their code-page byte.
-    std::wstring made = bed::MakeAppDir();
-    std::wstring app = made + L"-\x00fc\x0416\x6587";
+    // Class and library paths go through code page 1252: U+00FC is its byte 0xfc, U+0416 and
+    // U+6587 its default character.
+    ASSERT_EQ(GetACP(), 1252u);
+    std::wstring made = bed::MakeAppDir(), app = made + L"-\x00fc\x0416\x6587";
     ASSERT_TRUE(MoveFileW(made.c_str(), app.c_str()));
-    Launch launch = RunWith(L"-noSplash", app);
-    const std::string narrow = jvmtest::Ansi(app);
-    ASSERT_EQ(GetACP(), 1252u) << "the expected bytes below are those of code page 1252";
-    EXPECT_EQ(narrow.substr(narrow.size() - 4), "-\xfc??");
-    ASSERT_GE(launch.record.options.size(), 7u);
-    EXPECT_EQ(launch.record.options[0], "-Djava.class.path=" + jvmtest::Escaped(narrow) + "\\emu57.jar");
-    EXPECT_EQ(launch.record.options[6], "-Djava.library.path=" + jvmtest::Escaped(narrow));
+    std::vector<std::string> tail = DefaultFolders();
+    tail.insert(tail.begin(), kNoSplash);
+    EXPECT_EQ(OptionsOf(app, LauncherLine(app, L"-noSplash")), Expected(bed::ToUtf8(made) + "-\\xfc??", tail));
 }
 
 }  // namespace

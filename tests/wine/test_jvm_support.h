@@ -1,12 +1,9 @@
-// Shared pieces of the VM host tests: reading the VM double's record in parts, the special folders
-// of the prefix redirected through its registry, the splash window of a running launcher, and the
-// expected forms of texts (hex encoding, the record's byte escapes, the ANSI code page).
+// Shared pieces of the VM host tests: the VM double's record split up, the calls of a normal run
+// and the hex form of a text (also used by the instance tests).
 #ifndef TESTS_WINE_TEST_JVM_SUPPORT_H
 #define TESTS_WINE_TEST_JVM_SUPPORT_H
 
 #include <gtest/gtest.h>
-#include <windows.h>
-#include <shlobj.h>
 
 #include <stdio.h>
 
@@ -23,51 +20,53 @@ struct LogFolder : ::testing::Environment {
 };
 inline ::testing::Environment* const kLogFolder = ::testing::AddGlobalTestEnvironment(new LogFolder);
 
-const char kMainClass[] = "com/qz/kpo/emu57/app/ApplicationMainForm";
-const char kNoSplashOption[] = "-Dapp.lumiscope57.noSplash=true";
+const std::string kMain = "com/qz/kpo/emu57/app/ApplicationMainForm";
+const std::string kMainMethod = "GetStaticMethodID " + kMain + " main ([Ljava/lang/String;)V";
 
-// Options 1-10, which every launch carries, for application directory `app` (narrow form).
+// Options 1-10, which every launch carries, for application directory `app` (as recorded).
 inline std::vector<std::string> FixedOptions(const std::string& app) {
-    return {"-Djava.class.path=" + app + "\\emu57.jar",
-            "-Xms64m",
-            "-Xmx256m",
-            "-Dswing.aatext=true",
-            "-DencodedFilenames=true",
-            "-Dsun.locale.formatasdefault=true",
-            "-Djava.library.path=" + app,
-            "-DconsoleLogLevel=ALL",
-            "-DfileLogLevel=INFO",
-            "-DjniFileLogLevel=3"};
+    return {"-Djava.class.path=" + app + "\\emu57.jar", "-Xms64m", "-Xmx256m", "-Dswing.aatext=true",
+            "-DencodedFilenames=true", "-Dsun.locale.formatasdefault=true", "-Djava.library.path=" + app,
+            "-DconsoleLogLevel=ALL", "-DfileLogLevel=INFO", "-DjniFileLogLevel=3"};
 }
 
-// The record split at its first FindClass line: creation (create line + options) and the rest.
+// The record: its creation line, the option texts ("<BAD>..." for a malformed line) and the calls.
 struct Record {
-    std::vector<std::string> lines;
-    std::string createLine;
-    std::vector<std::string> options;  // option texts; "<BAD>..." for a line of another form
-    std::vector<std::string> calls;    // every line after the options
+    std::vector<std::string> lines, options, calls;
 };
 
 inline Record ReadRecord(const std::wstring& appDir) {
     Record r;
     r.lines = bed::ReadRecord(appDir);
-    size_t i = 0;
-    if (i < r.lines.size()) r.createLine = r.lines[i++];
+    size_t i = r.lines.empty() ? 0 : 1;
     for (; i < r.lines.size() && r.lines[i].compare(0, 7, "option[") == 0; ++i) {
         const std::string& line = r.lines[i];
-        std::string head = "option[" + std::to_string(r.options.size()) + "]=";
-        const std::string tail = " extraInfo=null";
-        bool wellFormed = line.size() >= head.size() + tail.size() && line.compare(0, head.size(), head) == 0 &&
-                          line.compare(line.size() - tail.size(), tail.size(), tail) == 0;
-        r.options.push_back(wellFormed ? line.substr(head.size(), line.size() - head.size() - tail.size())
-                                       : "<BAD>" + line);
+        const std::string head = "option[" + std::to_string(r.options.size()) + "]=", tail = " extraInfo=null";
+        bool good = line.size() >= head.size() + tail.size() && line.compare(0, head.size(), head) == 0 &&
+                    line.compare(line.size() - tail.size(), tail.size(), tail) == 0;
+        r.options.push_back(good ? line.substr(head.size(), line.size() - head.size() - tail.size()) : "<BAD>" + line);
     }
     r.calls.assign(r.lines.begin() + static_cast<std::ptrdiff_t>(i), r.lines.end());
+    if (!r.lines.empty())
+        EXPECT_EQ(r.lines[0], "JNI_CreateJavaVM version=0x00010006 nOptions=" + std::to_string(r.options.size()) +
+                                  " ignoreUnrecognized=1");
     return r;
 }
 
-inline std::string CreateLine(size_t options) {
-    return "JNI_CreateJavaVM version=0x00010006 nOptions=" + std::to_string(options) + " ignoreUnrecognized=1";
+// The calls after the options of a run whose arguments encode to `encoded`.
+inline std::vector<std::string> NormalCalls(const std::vector<std::string>& encoded) {
+    const std::string n = std::to_string(encoded.size());
+    std::vector<std::string> calls = {"FindClass java/lang/String", "FindClass " + kMain, kMainMethod,
+                                      "NewObjectArray length=" + n + " class=java/lang/String init=null"};
+    for (size_t i = 0; i < encoded.size(); ++i) {
+        calls.push_back("NewStringUTF " + encoded[i]);
+        calls.push_back("SetObjectArrayElement index=" + std::to_string(i) + " value=" + encoded[i]);
+    }
+    calls.push_back("CallStaticVoidMethodV " + kMain + ".main argc=" + n);
+    for (size_t i = 0; i < encoded.size(); ++i) calls.push_back("arg[" + std::to_string(i) + "]=" + encoded[i]);
+    calls.push_back("main returned");
+    calls.push_back("DestroyJavaVM");
+    return calls;
 }
 
 // Four lower-case hex digits per UTF-16 unit, written out independently of the launcher.
@@ -80,41 +79,6 @@ inline std::string Hex(const std::wstring& text) {
     }
     return out;
 }
-
-// Bytes as the double records them: below 0x20 and from 0x7f up as \xHH.
-inline std::string Escaped(const std::string& bytes) {
-    std::string out;
-    char escape[8];
-    for (unsigned char b : bytes) {
-        if (b < 0x20 || b >= 0x7f) {
-            snprintf(escape, sizeof escape, "\\x%02x", b);
-            out += escape;
-        } else {
-            out.push_back(static_cast<char>(b));
-        }
-    }
-    return out;
-}
-
-// `text` in the ANSI code page of this prefix (unmappable characters become the default one).
-inline std::string Ansi(const std::wstring& text) {
-    int n = WideCharToMultiByte(CP_ACP, 0, text.c_str(), -1, nullptr, 0, nullptr, nullptr);
-    std::string out(static_cast<size_t>(n > 0 ? n : 1), '\0');
-    WideCharToMultiByte(CP_ACP, 0, text.c_str(), -1, &out[0], n, nullptr, nullptr);
-    out.resize(out.size() - 1);
-    return out;
-}
-
-inline std::wstring Folder(int csidl) {
-    wchar_t path[MAX_PATH] = {0};
-    SHGetFolderPathW(nullptr, csidl, nullptr, SHGFP_TYPE_CURRENT, path);
-    return path;
-}
-
-using bed::FolderOverride;
-
-// True once the process `pid` has its splash window, waiting up to `timeoutMs`.
-inline bool SplashUp(DWORD pid, DWORD timeoutMs) { return bed::WaitForSplash(pid, timeoutMs) != nullptr; }
 
 }  // namespace jvmtest
 
