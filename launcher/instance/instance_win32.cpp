@@ -11,7 +11,6 @@
 #include <winsock2.h>
 #include <windows.h>
 
-#include <stdio.h>
 #include <string.h>
 #include <wchar.h>
 
@@ -70,11 +69,10 @@ BOOL CALLBACK ActivateRunningInstance(HWND window, LPARAM) {
     memset(className, 0, sizeof className);
     if (GetClassNameW(window, className, kClassUnits) == 0) return TRUE;
 
+    // Its 34 characters and the terminator.
     WCHAR frameClass[sizeof kFrameClassName];
     memset(frameClass, 0, sizeof frameClass);
-    int frameClassUnits = lstrlenA(kFrameClassName) + 1;
-    if (frameClassUnits > static_cast<int>(sizeof kFrameClassName)) return TRUE;
-    if (!WidenFrameClassName(frameClass, frameClassUnits)) return TRUE;
+    if (!WidenFrameClassName(frameClass, lstrlenA(kFrameClassName) + 1)) return TRUE;
     if (_wcsicmp(className, frameClass) != 0) return TRUE;
 
     if (IsIconic(window)) ShowWindow(window, SW_RESTORE);
