@@ -17,6 +17,17 @@ state=$(mkdir -p "$state" && cd "$state" && pwd)
 
 say() { printf '[wine-bed] %s\n' "$*" >&2; }
 
+# Debian's `wine` script takes the 32-bit loader whenever it is installed, also on a machine that
+# cannot execute 32-bit programs; there the 64-bit loader runs x86_64 programs directly. Which one
+# works is found out by executing it.
+pick_loader() {
+  if /usr/lib/wine/wine --version >/dev/null 2>&1 || [ ! -x /usr/lib/wine/wine64 ]; then
+    echo "export WINE=wine"
+  else
+    echo "export WINE=/usr/lib/wine/wine64 WINELOADER=/usr/lib/wine/wine64"
+  fi
+}
+
 write_env() {
   cat >"$state/env.sh" <<ENV
 export WINEPREFIX='$state/prefix'
@@ -26,6 +37,7 @@ export DISPLAY=':$1'
 export WINEDEBUG=-all
 export WINEDLLOVERRIDES='mscoree,mshtml=;winemenubuilder.exe=d'
 unset WINEARCH
+$(pick_loader)
 ENV
 }
 
@@ -54,9 +66,9 @@ setup() {
     echo $! >"$state/xcompmgr.pid"
   fi
   say "prefix $WINEPREFIX on display $DISPLAY"
-  timeout 180 wineboot -i >"$state/wineboot.log" 2>&1 </dev/null || { say "wineboot failed"; cat "$state/wineboot.log" >&2; exit 1; }
+  timeout 180 $WINE wineboot.exe -i >"$state/wineboot.log" 2>&1 </dev/null || { say "wineboot failed"; cat "$state/wineboot.log" >&2; exit 1; }
   wineserver -p </dev/null >/dev/null 2>&1
-  reg() { timeout 60 wine reg add "$@" /f >/dev/null 2>&1 </dev/null; }
+  reg() { timeout 60 $WINE reg add "$@" /f >/dev/null 2>&1 </dev/null; }
   reg 'HKCU\Software\Wine\X11 Driver' /v Managed /d N
   local view
   for view in /reg:64 /reg:32; do
@@ -79,8 +91,8 @@ case "$action" in
     # program would inherit and hold open the caller's output, so a test runner reading it would
     # wait for them. Start them detached first; they stay up until teardown.
     wineserver -p </dev/null >/dev/null 2>&1
-    timeout 120 wineboot </dev/null >/dev/null 2>&1
-    exec wine "$@" ;;
+    timeout 120 $WINE wineboot.exe </dev/null >/dev/null 2>&1
+    exec $WINE "$@" ;;
   env) cat "$state/env.sh" ;;
   teardown)
     if [ -f "$state/env.sh" ]; then
