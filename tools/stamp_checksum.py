@@ -1,10 +1,12 @@
 #!/usr/bin/env python3
-"""Stamps the PE image checksum into an executable's optional header, in place.
+"""Stamps the checksum of an executable into its own stamp field, in place.
 
-GNU ld leaves the field 0; the launcher compares it with a checksum of its own file at start-up
-(launcher/protection). The sum is the usual image checksum: the file's little-endian 16-bit words
-(an odd last byte as a word of its own) added with end-around carry, the four bytes of the checksum
-field counted as zero, then the file length added. Stamping twice gives the same file.
+The launcher compares the field with a checksum of its own file at start-up (launcher/protection).
+Windows: the PE image checksum field of the optional header (GNU ld leaves it 0). ELF: the four
+bytes after the marker "QZ57-STAMP-1" in the launcher's data, which must appear exactly once. The
+sum is the usual image checksum: the file's little-endian 16-bit words (an odd last byte as a word
+of its own) added with end-around carry, the four bytes of the field counted as zero, then the file
+length added. Stamping twice gives the same file.
 
 Usage: stamp_checksum.py FILE [--print]
   --print  only prints the stamped and the computed value; exit status 1 when they differ
@@ -16,7 +18,15 @@ from array import array
 CHECKSUM_IN_OPTIONAL_HEADER = 64  # the same in PE32 and PE32+
 
 
+ELF_MARKER = b"QZ57-STAMP-1"
+
+
 def checksum_offset(data: bytes) -> int:
+    if data[:4] == b"\x7fELF":
+        at = data.find(ELF_MARKER)
+        if at < 0 or data.find(ELF_MARKER, at + 1) >= 0:
+            raise ValueError("the stamp marker must appear exactly once")
+        return at + len(ELF_MARKER)
     if len(data) < 0x40 or data[:2] != b"MZ":
         raise ValueError("not an MZ image")
     pe = struct.unpack_from("<I", data, 0x3C)[0]

@@ -13,24 +13,13 @@
 #include <stddef.h>
 #include <stdint.h>
 
-// Status codes are signed 32-bit: 0 success, small negative numbers for the launcher's own failures,
-// anything else passed through from the VM or the self-protection stage.
-typedef int32_t Status;
-
-enum {
-    kStatusOk = 0,
-    kStatusNotFound = -1,     // library or class not found / not loaded
-    kStatusNoMainMethod = -2, // the main class has no static main(String[])
-    kStatusNoVmSilent = -3,   // the VM was not created and there was no message text
-};
+#include "status.h"
 
 // Fixed names of this product. They are constants of the build, never read from the environment.
 #define LAUNCHER_EXE_NAME "QZ-Lumiscope_QZ-57.exe"
-#define LAUNCHER_LOG_RELATIVE_PATH u"QZ-LumiscopeQZ-57Nova\\logs\\QZ-LumiscopeQZ-57Nova-L.log"
 #define LAUNCHER_MAIN_CLASS "com/qz/kpo/emu57/app/ApplicationMainForm"
 #define LAUNCHER_FRAME_CLASS_NAME "com.qz.kpo.emu57.app.EmulatorFrame"
 #define LAUNCHER_SPLASH_RESOURCE "BITMAP_SPLASH_57"
-#define LAUNCHER_VM_LIBRARY "jre\\bin\\client\\jvm.dll"
 #define LAUNCHER_CLASS_PATH_JAR "emu57.jar"
 #define LAUNCHER_NO_SPLASH_SWITCH u"-noSplash"
 
@@ -43,6 +32,17 @@ enum { kInstanceNameBytes = 18 };
 enum { kHandOffPort = 6152 };
 
 enum { kMaxPathUnits = 260 };
+
+// The platform's directory separator as a one-character text ("\\" or "/"), for the class path.
+extern const char kDirectorySeparator[];
+
+// The user's settings folder on POSIX systems: $XDG_CONFIG_HOME, or $HOME/.config when the
+// variable is unset or empty; its bytes as they are. False when there is no home to put it in.
+// (core/paths_posix.cpp; used by the POSIX platform files of the start-up and the VM host.)
+bool FindConfigHome(char* out, size_t size);
+// Makes the directory of the executable file itself the current directory; false when it cannot
+// be found or entered (the current directory then stays as it was).
+bool EnterExecutableDirectory();
 
 // "QZ-Lumiscope_QZ-57.exe" once the documents folder was found, empty otherwise. Written by the
 // start-up sequence before any other thread exists; read by the start-up sequence and the

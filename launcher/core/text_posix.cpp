@@ -1,5 +1,5 @@
-// Narrow text on POSIX systems: UTF-8. Unpaired surrogates and invalid sequences fail the
-// conversion, as a strict code-page conversion does on Windows.
+// Narrow text on POSIX systems: UTF-8. From UTF-16, an unpaired surrogate fails the conversion, as a
+// strict code-page conversion does on Windows; into UTF-16, ill-formed bytes are replaced.
 #include "core.h"
 
 #include <stdarg.h>
@@ -46,7 +46,10 @@ int EncodeUtf8(const char16_t* text, char* out, int outBytes) {
 }
 
 // Decodes at most `sourceBytes` bytes (-1: through the terminator) of UTF-8 into `out` (when
-// non-null); returns the units written/needed, or 0 on failure.
+// non-null); returns the units written/needed, or 0 when `out` is too small. Arguments arrive as
+// bytes, so nothing is refused: every maximal subpart of an ill-formed sequence becomes one U+FFFD
+// (overlong forms, encoded surrogates and values above U+10FFFF are ill-formed), as the Unicode
+// Standard recommends: C0 AF gives two, ED A0 80 three, F4 90 80 80 four.
 int DecodeUtf8(const char* text, int sourceBytes, char16_t* out, int outUnits) {
     const unsigned char* s = reinterpret_cast<const unsigned char*>(text);
     int n = 0;
@@ -58,30 +61,40 @@ int DecodeUtf8(const char* text, int sourceBytes, char16_t* out, int outUnits) {
         ++n;
         return true;
     };
+    auto byteAt = [&](int i) -> int { return sourceBytes >= 0 && i >= sourceBytes ? -1 : s[i]; };
     for (int i = 0; sourceBytes < 0 || i < sourceBytes;) {
         uint32_t c = s[i];
-        int extra = c < 0x80 ? 0 : (c >> 5) == 6 ? 1 : (c >> 4) == 14 ? 2 : (c >> 3) == 30 ? 3 : -1;
-        if (extra < 0) return 0;
-        if (sourceBytes >= 0 && i + extra >= sourceBytes) return 0;
-        uint32_t cp = extra == 0 ? c : c & (0x3F >> extra);
-        for (int k = 1; k <= extra; ++k) {
-            if ((s[i + k] & 0xC0) != 0x80) return 0;
-            cp = (cp << 6) | (s[i + k] & 0x3F);
+        // Length of the sequence and the range of its second byte (Unicode's table of well-formed
+        // byte sequences); a lead byte outside the table is a maximal subpart of one byte.
+        int length = c < 0x80 ? 1 : c < 0xC2 ? 0 : c < 0xE0 ? 2 : c < 0xF0 ? 3 : c < 0xF5 ? 4 : 0;
+        int low = c == 0xE0 ? 0xA0 : c == 0xF0 ? 0x90 : 0x80;
+        int high = c == 0xED ? 0x9F : c == 0xF4 ? 0x8F : 0xBF;
+        uint32_t cp = length == 1 ? c : c & (0x3F >> (length > 0 ? length : 1));
+        int taken = 1;
+        for (; taken < length; ++taken) {
+            int next = byteAt(i + taken);
+            if (next < (taken == 1 ? low : 0x80) || next > (taken == 1 ? high : 0xBF)) break;
+            cp = (cp << 6) | (static_cast<uint32_t>(next) & 0x3F);
         }
-        i += extra + 1;
-        if (cp >= 0x10000) {
+        i += taken;
+        if (length == 0 || taken < length) {
+            if (!put(0xFFFD)) return 0;
+        } else if (cp >= 0x10000) {
             cp -= 0x10000;
             if (!put(static_cast<char16_t>(0xD800 + (cp >> 10))) || !put(static_cast<char16_t>(0xDC00 + (cp & 0x3FF))))
                 return 0;
         } else if (!put(static_cast<char16_t>(cp))) {
             return 0;
+        } else if (cp == 0 && sourceBytes < 0) {
+            break;
         }
-        if (cp == 0 && sourceBytes < 0) break;
     }
     return n;
 }
 
 }  // namespace
+
+const char kDirectorySeparator[] = "/";
 
 int NarrowSize(const char16_t* text) { return text == nullptr ? 0 : EncodeUtf8(text, nullptr, 0); }
 int WideSize(const char* text) { return text == nullptr ? 0 : DecodeUtf8(text, -1, nullptr, 0); }

@@ -5,6 +5,8 @@
 #include <stdarg.h>
 #include <stdio.h>
 
+const char kDirectorySeparator[] = "\\";
+
 int NarrowSize(const char16_t* text) {
     if (text == nullptr) return 0;
     return WideCharToMultiByte(CP_THREAD_ACP, 0, reinterpret_cast<LPCWSTR>(text), -1, nullptr, 0, nullptr, nullptr);

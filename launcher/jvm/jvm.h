@@ -10,10 +10,10 @@
 
 #include "../core/core.h"
 
-// `instance` is the launcher's module instance; argv[0] is the executable's path as typed.
-// Result: -1 VM library not loaded; the creation error, -1 for a missing entry point, or -3 when the
-// VM was not created and there is no message text; otherwise the DestroyJavaVM result.
-Status LaunchJavaApplication(void* instance, int32_t argc, char16_t** argv);
+// argv[0] is the program as started. Result: -1 VM library not loaded; the creation error, -1 for
+// a missing entry point, or -3 when the VM was not created and there is no message text; otherwise
+// the DestroyJavaVM result.
+Status LaunchJavaApplication(int32_t argc, char16_t** argv);
 
 // Appends a private heap copy of `text` to the process-wide option list (grows by one per call).
 void AddVmOption(const char* text);

@@ -1,9 +1,10 @@
 // Inside the VM host: the VM state shared by its portable and platform files, the option list, and
 // the inputs from which the option list is composed.
 //
-// The platform file gathers the inputs (application directory, special folders) and loads the VM
-// library; vm_options.cpp turns the inputs into options and owns the VM state; java_main.cpp reads
-// the JNIEnv pointer from it. Everything here runs on the launcher's main thread.
+// launch.cpp is LaunchJavaApplication itself; the platform file (jvm_win32.cpp, jvm_posix.cpp)
+// finds the application directory and the settings folders and loads the VM library;
+// vm_options.cpp turns the inputs into options and owns the VM state; java_main.cpp reads the
+// JNIEnv pointer from it. Everything here runs on the launcher's main thread.
 #ifndef LAUNCHER_JVM_JVM_INTERNAL_H
 #define LAUNCHER_JVM_JVM_INTERNAL_H
 
@@ -26,9 +27,9 @@ extern VmState JvmState;
 int32_t VmOptionCount();
 const JavaVMOption* VmOptionRecords();
 
-// What the option list is built from. The texts are narrow; `userAppData` is the per-user
-// application-data folder narrowed byte by byte (NarrowLowBytes), meaningful only when
-// `userAppDataFound`. A null `appDirectory` (its conversion failed) is written as "(null)".
+// What the option list is built from. The texts are narrow; `userAppData` is the per-user settings
+// folder as the platform passes it (on Windows narrowed byte by byte, NarrowLowBytes), meaningful
+// only when `userAppDataFound`. A null `appDirectory` (its conversion failed) is written as "(null)".
 struct VmOptionInputs {
     const char* appDirectory;
     int32_t argc;
@@ -41,6 +42,17 @@ struct VmOptionInputs {
 // Appends the launch options in their fixed order (see vm_options.cpp). Sets NoSplash once for
 // every "-noSplash" argument, in any letter case, at any position.
 void ComposeVmOptions(const VmOptionInputs& inputs);
+
+// ---- Platform layer, called by LaunchJavaApplication in this order.
+
+// Makes the application directory the current directory for good and returns the current directory
+// as re-read, narrow, in a heap copy (null when it cannot be had or converted).
+char* EnterVmDirectory(const char16_t* argv0);
+// Loads the private runtime's VM library, relative to the current directory (LoadJvmLibrary).
+Status LoadPrivateRuntime();
+// The settings-folder inputs of the option list: userAppDataFound, userAppData, commonAppDataFound.
+// `userAppData` points into storage that lives until the VM is created.
+void FindSettingsFolders(VmOptionInputs* inputs);
 
 enum { kFolderPathUnits = 260 };
 // The special-folder paths reach the VM as the low 8 bits of each of the buffer's 260 units, with

@@ -1,14 +1,11 @@
-// The VM host on Windows: the application directory, the VM library of the private runtime, the
-// special folders of the option list, the message boxes of the failure paths.
+// The VM host on Windows: the application directory, the VM library of the private runtime and the
+// special folders of the option list.
 #include <windows.h>
 #include <shlobj.h>
 #include <shlwapi.h>
 #include <stdlib.h>
 
 #include "jvm_internal.h"
-#include "../resources/resource_ids.h"
-#include "../splash/splash.h"
-#include "../startup/startup.h"
 
 namespace {
 
@@ -28,16 +25,10 @@ static_assert(SameType<CreateJavaVmEntry, jint(__stdcall*)(JavaVM**, void**, voi
 static_assert(SameType<decltype(JNINativeInterface_::FindClass), jclass(__stdcall*)(JNIEnv*, const char*)>::value,
               "the JNI function table must be called as __stdcall");
 
-const int kMessageUnits = 1024;
+const char kVmLibrary[] = "jre\\bin\\client\\jvm.dll";
 
-// Shows string `id` of the string table, converted to narrow text; false when there is no such
-// string (then nothing is shown).
-bool ShowStringBox(HINSTANCE instance, UINT id) {
-    WCHAR message[kMessageUnits];
-    if (LoadStringW(instance, id, message, kMessageUnits) <= 0) return false;
-    ShowErrorBox(NarrowCopy(reinterpret_cast<const char16_t*>(message)));
-    return true;
-}
+// The per-user folder, narrowed byte by byte; lives until the VM is created.
+char userAppDataNarrow[kFolderPathUnits + 1];
 
 }  // namespace
 
@@ -54,70 +45,45 @@ Status LoadJvmLibrary(const char* path) {
     return kStatusOk;
 }
 
-Status LaunchJavaApplication(void* instance, int32_t argc, char16_t** argv) {
-    HINSTANCE module = static_cast<HINSTANCE>(instance);
-
-    // The application directory is the directory of argv[0], made the current directory for good;
-    // from here on it is the current directory as re-read (normally without trailing backslash).
+// The directory of argv[0] as typed, made the current directory for good; from here on it is the
+// current directory as re-read (normally without trailing backslash).
+char* EnterVmDirectory(const char16_t* argv0) {
     WCHAR drive[_MAX_DRIVE], directory[_MAX_DIR], name[_MAX_FNAME], extension[_MAX_EXT];
     WCHAR appDirectory[MAX_PATH];
-    _wsplitpath(reinterpret_cast<const wchar_t*>(argv[0]), drive, directory, name, extension);
+    _wsplitpath(reinterpret_cast<const wchar_t*>(argv0), drive, directory, name, extension);
     wsprintfW(appDirectory, L"%s%s", drive, directory);
     SetCurrentDirectoryW(appDirectory);
     GetCurrentDirectoryW(MAX_PATH, appDirectory);
+    return NarrowCopy(reinterpret_cast<const char16_t*>(appDirectory));
+}
 
-    // The VM library and the libraries the VM loads later need the C runtime that sits in the
-    // runtime's bin folder, which the standard search does not look in: that folder joins the DLL
-    // search for the rest of the process. The library itself is still found by its relative path.
-    // While a DLL folder is set the current directory leaves the search, so when that hides the
-    // library (argv[0] naming another directory than the program file's), the plain search is
-    // tried once more.
+// The VM library and the libraries the VM loads later need the C runtime that sits in the
+// runtime's bin folder, which the standard search does not look in: that folder joins the DLL
+// search for the rest of the process. The library itself is still found by its relative path.
+// While a DLL folder is set the current directory leaves the search, so when that hides the
+// library (argv[0] naming another directory than the program file's), the plain search is tried
+// once more.
+Status LoadPrivateRuntime() {
+    WCHAR current[MAX_PATH];
     WCHAR runtimeBin[MAX_PATH];
-    bool dllDirectorySet =
-        PathCombineW(runtimeBin, appDirectory, L"jre\\bin") != nullptr && SetDllDirectoryW(runtimeBin) != FALSE;
-    Status loaded = LoadJvmLibrary(LAUNCHER_VM_LIBRARY);
+    bool dllDirectorySet = GetCurrentDirectoryW(MAX_PATH, current) != 0 &&
+                           PathCombineW(runtimeBin, current, L"jre\\bin") != nullptr &&
+                           SetDllDirectoryW(runtimeBin) != FALSE;
+    Status loaded = LoadJvmLibrary(kVmLibrary);
     if (loaded != kStatusOk && dllDirectorySet) {
         SetDllDirectoryW(nullptr);
-        loaded = LoadJvmLibrary(LAUNCHER_VM_LIBRARY);
+        loaded = LoadJvmLibrary(kVmLibrary);
     }
-    if (loaded != kStatusOk) {
-        ShowStringBox(module, IDS_VM_LIBRARY_NOT_LOADED);
-        return kStatusNotFound;
-    }
+    return loaded;
+}
 
-    // Both folder queries without creating anything; a failed query only drops its option.
+// Both folder queries without creating anything; a failed query only drops its option. The
+// per-user path reaches the VM as the low byte of each of its 260 units, on purpose.
+void FindSettingsFolders(VmOptionInputs* inputs) {
     WCHAR userAppData[MAX_PATH] = {0};
     WCHAR commonAppData[MAX_PATH] = {0};
-    bool userAppDataFound = SHGetSpecialFolderPathW(nullptr, userAppData, CSIDL_APPDATA, FALSE) != FALSE;
-    bool commonAppDataFound = SHGetSpecialFolderPathW(nullptr, commonAppData, CSIDL_COMMON_APPDATA, FALSE) != FALSE;
-    char userAppDataNarrow[kFolderPathUnits + 1];
+    inputs->userAppDataFound = SHGetSpecialFolderPathW(nullptr, userAppData, CSIDL_APPDATA, FALSE) != FALSE;
+    inputs->commonAppDataFound = SHGetSpecialFolderPathW(nullptr, commonAppData, CSIDL_COMMON_APPDATA, FALSE) != FALSE;
     NarrowLowBytes(reinterpret_cast<const char16_t*>(userAppData), userAppDataNarrow);
-
-    char* appDirectoryNarrow = NarrowCopy(reinterpret_cast<const char16_t*>(appDirectory));
-    VmOptionInputs inputs;
-    inputs.appDirectory = appDirectoryNarrow;
-    inputs.argc = argc;
-    inputs.argv = argv;
-    inputs.userAppDataFound = userAppDataFound;
-    inputs.userAppData = userAppDataNarrow;
-    inputs.commonAppDataFound = commonAppDataFound;
-    ComposeVmOptions(inputs);
-    free(appDirectoryNarrow);
-
-    Status created = CreateVm();
-    if (created != kStatusOk) {
-        // Without a message text the result is -3 whatever the VM said.
-        return ShowStringBox(module, IDS_VM_NOT_CREATED) ? created : kStatusNoVmSilent;
-    }
-
-    // Returns when the Java main method has returned.
-    if (CallJavaMain(LAUNCHER_MAIN_CLASS, argv, argc) != kStatusOk) ShowStringBox(module, IDS_MAIN_CLASS_NOT_CALLED);
-
-    // Waits for the Java application's last non-daemon thread.
-    Status destroyed = DestroyVm();
-    char destroyText[64];
-    FormatText(destroyText, sizeof destroyText, "jvm destroy res=%d", static_cast<int>(destroyed));
-    ShowErrorBox(destroyText);
-    SplashClose();
-    return destroyed;
+    inputs->userAppData = userAppDataNarrow;
 }

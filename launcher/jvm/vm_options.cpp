@@ -56,7 +56,8 @@ void ComposeVmOptions(const VmOptionInputs& inputs) {
     // A failed conversion of the directory prints as the C runtimes print a null text.
     const char* appDirectory = inputs.appDirectory != nullptr ? inputs.appDirectory : "(null)";
     char classPath[kOptionTextBytes];
-    FormatText(classPath, sizeof classPath, "-Djava.class.path=%s\\%s", appDirectory, LAUNCHER_CLASS_PATH_JAR);
+    FormatText(classPath, sizeof classPath, "-Djava.class.path=%s%s%s", appDirectory, kDirectorySeparator,
+               LAUNCHER_CLASS_PATH_JAR);
     AddVmOption(classPath);
 
     AddVmOption("-Xms64m");

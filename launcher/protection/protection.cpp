@@ -1,5 +1,5 @@
-// The image checksum of the first self-protection check, over a file held in memory. The build
-// stamps the same value into the file after linking (tools/stamp_checksum.py).
+// The checksum of the first self-protection check, over a file held in memory. The build stamps
+// the same value into the file after linking (tools/stamp_checksum.py).
 #include "protection.h"
 
 namespace {
@@ -48,6 +48,11 @@ uint32_t ComputeImageChecksum(const uint8_t* image, uint32_t length, uint32_t fi
 Status VerifyImageChecksum(const uint8_t* image, uint32_t length) {
     uint32_t field = 0;
     if (!FindImageChecksumField(image, length, &field)) return kProtectionImageUnreadable;
+    return VerifyStampedChecksum(image, length, field);
+}
+
+Status VerifyStampedChecksum(const uint8_t* image, uint32_t length, uint32_t field) {
+    if (field > length || length - field < 4) return kProtectionImageUnreadable;
     const uint32_t stamped = ReadU32(image + field);
     if (stamped == 0) return kProtectionPassed;  // an unstamped development build
     return ComputeImageChecksum(image, length, field) == stamped ? kProtectionPassed : kProtectionImageAltered;

@@ -10,23 +10,14 @@
 
 #include "../core/core.h"
 
-// Results of the checks. They become the process exit code, so they are chosen apart from every
-// other exit code of the launcher: the VM host's own -1..-3, the JNI errors -1..-6 passed through
-// from the VM, the start-up log codes 1012 and -767, and the exception codes of a crash. Their low
-// bytes (213, 214, 57, 58) also differ from those codes' low bytes, for tools that see only the
-// low byte of an exit code. The 6xxx range is the self-protection stage's.
-enum {
-    kProtectionPassed = 0,
-    kProtectionImageAltered = 6101,     // the file's checksum differs from the one stamped at build time
-    kProtectionImageUnreadable = 6102,  // our own file could not be opened, mapped or parsed as an image
-    kProtectionDebuggerLocal = 6201,    // the process is being debugged (IsDebuggerPresent)
-    kProtectionDebuggerRemote = 6202,   // a debugger is attached to the process (CheckRemoteDebuggerPresent)
-};
+// Results: kProtection* in core/status.h. Platform files: protection_win32.cpp (the PE image
+// checksum field; IsDebuggerPresent), protection_posix.cpp (a stamp field in the executable's data;
+// TracerPid).
 
-// Integrity of the launcher's own executable file (first check): its stamped image checksum
-// against one computed afresh. A stamp of 0 (an unstamped development build) passes.
+// Integrity of the launcher's own executable file (first check): the checksum stamped into it at
+// build time against one computed afresh. A stamp of 0 (an unstamped development build) passes.
 Status ProtectionCheckImage();
-// No debugger attached to the process, local or remote (second check).
+// No debugger attached to the process (second check).
 Status ProtectionCheckDebugger();
 
 // ---- Portable pieces of the first check (protection.cpp).
@@ -39,8 +30,10 @@ bool FindImageChecksumField(const uint8_t* image, uint32_t length, uint32_t* fie
 // little-endian 16-bit words (an odd last byte as a word of its own) summed with end-around carry,
 // then the file length added.
 uint32_t ComputeImageChecksum(const uint8_t* image, uint32_t length, uint32_t fieldOffset);
-// The first check over a file's bytes: kProtectionPassed, kProtectionImageAltered or
+// The first check over a PE file's bytes: kProtectionPassed, kProtectionImageAltered or
 // kProtectionImageUnreadable (not a PE image).
 Status VerifyImageChecksum(const uint8_t* image, uint32_t length);
+// The same comparison for a stamp field at `fieldOffset` (four little-endian bytes inside the file).
+Status VerifyStampedChecksum(const uint8_t* image, uint32_t length, uint32_t fieldOffset);
 
 #endif

@@ -89,3 +89,46 @@ bool ReadSplashBitmap(const uint8_t* data, size_t size, SplashBitmapInfo* info) 
     info->pixelOffset = pixelOffset;
     return true;
 }
+
+int SplashFadeNext(int* alpha) {
+    if (*alpha >= 255) return -1;
+    int now = *alpha;
+    *alpha += kSplashAlphaStep;
+    return now;
+}
+
+// The drawing side of the reader: every offset is checked again here, against the file image's own
+// size, so the decoder stays safe whatever the caller did with the info it was given.
+bool DecodeSplashPixels(const uint8_t* data, size_t size, const SplashBitmapInfo& info, uint32_t* out) {
+    if (data == nullptr || out == nullptr || info.pixelOffset == 0) return false;
+    if (size < kFileHeaderBytes + kInfoHeaderBytes || info.pixelOffset > size) return false;
+    if (ReadU32(data + kCompressionAt) != 0) return false;
+    uint16_t bitCount = ReadU16(data + kBitCountAt);
+    long table = ColourTableBytes(bitCount);
+    if (table < 0 || info.pixelOffset < kFileHeaderBytes + kInfoHeaderBytes + static_cast<size_t>(table)) return false;
+    if (info.width <= 0 || info.height <= 0) return true;  // nothing to draw
+
+    const uint8_t* palette = data + info.pixelOffset - table;
+    const uint8_t* pixels = data + info.pixelOffset;
+    uint64_t stride = ((static_cast<uint64_t>(info.width) * bitCount + 31) / 32) * 4;
+    if (static_cast<uint64_t>(info.height) > (size - info.pixelOffset) / stride) return false;
+    // A negative stored height is a top-down picture: its first row is the top one.
+    bool topDown = static_cast<int32_t>(ReadU32(data + kHeightAt)) < 0;
+
+    for (int32_t y = 0; y < info.height; ++y) {
+        const uint8_t* row = pixels + stride * static_cast<uint64_t>(topDown ? y : info.height - 1 - y);
+        uint32_t* target = out + static_cast<size_t>(y) * static_cast<size_t>(info.width);
+        for (int32_t x = 0; x < info.width; ++x) {
+            const uint8_t* bgr;  // blue, green, red: a 24-bit pixel or a colour table entry
+            if (bitCount == 24) {
+                bgr = row + 3 * static_cast<size_t>(x);
+            } else {
+                size_t bit = static_cast<size_t>(x) * bitCount;
+                unsigned index = (row[bit / 8] >> (8 - bitCount - bit % 8)) & ((1u << bitCount) - 1);
+                bgr = palette + 4 * index;
+            }
+            target[x] = static_cast<uint32_t>(bgr[2]) << 16 | static_cast<uint32_t>(bgr[1]) << 8 | bgr[0];
+        }
+    }
+    return true;
+}

@@ -19,9 +19,6 @@ const wchar_t kClassName[] = L"SplashScreenWndClass";
 const wchar_t kResourceType[] = L"SPLASH";
 
 enum : UINT_PTR { kCloseTimer = 1, kFadeTimer = 2 };
-const UINT kFadeIntervalMs = 5;
-const int kFirstAlpha = 64;
-const int kAlphaStep = 4;
 
 // What the paint handler needs. Lives on the splash thread's stack for the life of the window and
 // hangs on the window as its user data.
@@ -38,7 +35,7 @@ typedef BOOL(WINAPI* SetLayeredWindowAttributesProc)(HWND, COLORREF, BYTE, DWORD
 // Process-wide state. The window handle is never cleared and the fade is never restarted: there is
 // one splash per process.
 HWND volatile gSplashWindow = nullptr;
-int gFadeAlpha = kFirstAlpha;
+int gFadeAlpha = kSplashFirstAlpha;
 HMODULE gUser32 = nullptr;
 SetLayeredWindowAttributesProc gSetLayeredWindowAttributes = nullptr;
 UINT_PTR gFadeTimer = 0;  // kept as returned, not used
@@ -82,9 +79,9 @@ void SplashFadeStep(HWND window) {
         }
     }
     if (gSetLayeredWindowAttributes == nullptr) return;
-    if (gFadeAlpha < 255) {
-        gSetLayeredWindowAttributes(window, RGB(255, 255, 255), static_cast<BYTE>(gFadeAlpha), LWA_ALPHA);
-        gFadeAlpha += kAlphaStep;
+    int alpha = SplashFadeNext(&gFadeAlpha);
+    if (alpha >= 0) {
+        gSetLayeredWindowAttributes(window, RGB(255, 255, 255), static_cast<BYTE>(alpha), LWA_ALPHA);
     } else {
         KillTimer(window, kFadeTimer);
     }
@@ -135,7 +132,8 @@ LRESULT CALLBACK SplashWndProc(HWND window, UINT message, WPARAM wParam, LPARAM 
 // The splash thread: owns the parameter copy, the DrawDib handle and the window.
 DWORD WINAPI SplashThreadProc(LPVOID parameter) {
     SplashParams* params = static_cast<SplashParams*>(parameter);
-    HINSTANCE instance = static_cast<HINSTANCE>(params->hInstance);
+    // The window class, the window and the picture all belong to the launcher's own module.
+    HINSTANCE instance = GetModuleHandleW(nullptr);
 
     HDRAWDIB drawDib = DrawDibOpen();
     if (drawDib == nullptr) {
@@ -146,7 +144,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
     int32_t height = 0;
     DWORD bytes = 0;
     HGLOBAL bitmap =
-        LoadSplashBitmap(static_cast<HMODULE>(params->hResourceModule), params->resourceName, &width, &height, &bytes);
+        LoadSplashBitmap(instance, params->resourceName, &width, &height, &bytes);
     const uint8_t* bitmapFile = bitmap != nullptr ? static_cast<const uint8_t*>(LockResource(bitmap)) : nullptr;
     if (bitmapFile == nullptr) {
         DrawDibClose(drawDib);
@@ -185,7 +183,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
 
     // Created hidden, exactly the picture's size. The result is not checked.
     HWND window = CreateWindowExW(exStyle, kClassName, L"", WS_POPUP, x, y, width, height,
-                                  static_cast<HWND>(params->hwndParent), nullptr, instance, nullptr);
+                                  nullptr, nullptr, instance, nullptr);
     // Opacity 64 before the window is ever shown, never 0.
     SplashFadeStep(window);
 
@@ -199,7 +197,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
 
     // The display time counts from here, fade included.
     UINT_PTR closeTimer = SetTimer(window, kCloseTimer, params->displayMs, nullptr);
-    gFadeTimer = SetTimer(window, kFadeTimer, kFadeIntervalMs, nullptr);
+    gFadeTimer = SetTimer(window, kFadeTimer, kSplashFadeIntervalMs, nullptr);
     if (closeTimer != 0) {
         ShowWindow(window, SW_SHOW);
     } else {

@@ -1,21 +1,28 @@
-// Launcher start-up: the entry point (WinMain in startup_win32.cpp) and the error box.
+// Launcher start-up: the fixed order of the start-up stages, written once (startup.cpp), over a
+// small platform layer (startup_win32.cpp with WinMain, startup_posix.cpp with main).
 //
-// ShowErrorBox is the launcher's one way of telling the user that something went wrong: a modal,
-// topmost box with the error icon and one OK button. The text is shown as it is (narrow, the
-// thread's code page); the caption is string 7 of the executable's string table, or "Error".
-// Called on the main thread only, by the start-up sequence and the VM host; it returns when the
-// user has dismissed the box. It raises a non-continuable exception when the window manager's
-// entry cannot be found (kErrorBoxNoUser32 / kErrorBoxNoMessageBox), which nobody catches.
+// The start-up sequence sits on top of every other subsystem and calls each of them; nothing calls
+// back up into it. Main thread only (on POSIX the "main thread" is the launcher thread that main
+// starts, see startup_posix.cpp).
 #ifndef LAUNCHER_STARTUP_STARTUP_H
 #define LAUNCHER_STARTUP_STARTUP_H
 
 #include "../core/core.h"
 
-enum : uint32_t {
-    kErrorBoxNoUser32 = 0x05400010u,
-    kErrorBoxNoMessageBox = 0x05400011u,
-};
+// The whole run: log, command line, application directory, instance lock, then either the
+// second-instance hand-off (result 0) or splash, self-protection and the Java application (their
+// result). The result is the process exit code.
+Status RunLauncher();
 
-void ShowErrorBox(const char* text);
+// ---- Platform layer, called by RunLauncher in this order.
+
+// The log file's full path in `path` (kMaxPathUnits units): the user's documents folder (created
+// when missing) joined with the log's relative path. False when there is no documents folder; the
+// path is then left empty.
+bool FindLogPath(char16_t* path);
+// The command line as UTF-16 texts, argv[0] the program as started; kept for the life of the process.
+char16_t** SplitCommandLine(int32_t* argc);
+// Makes the application directory the current directory (a failure leaves it as it was).
+void EnterApplicationDirectory(const char16_t* argv0);
 
 #endif

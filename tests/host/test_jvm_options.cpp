@@ -28,14 +28,15 @@ std::vector<std::string> Compose(const char* appDirectory) {
 }
 
 TEST(ComposeVmOptions, DirectoryForms) {
-    // The re-read current directory of a drive root keeps its backslash: the separator doubles.
-    std::vector<std::string> options = Compose("D:\\");
+    // A directory that ends in its separator (a drive root) keeps it: the separator doubles.
+    const std::string sep = kDirectorySeparator, root = "D:" + sep;
+    std::vector<std::string> options = Compose(root.c_str());
     ASSERT_EQ(options.size(), 10u);
-    EXPECT_EQ(options[0], "-Djava.class.path=D:\\\\emu57.jar");
-    EXPECT_EQ(options[6], "-Djava.library.path=D:\\");
+    EXPECT_EQ(options[0], "-Djava.class.path=" + root + sep + "emu57.jar");
+    EXPECT_EQ(options[6], "-Djava.library.path=" + root);
 
     options = Compose(nullptr);
-    EXPECT_EQ(options[0], "-Djava.class.path=(null)\\emu57.jar");
+    EXPECT_EQ(options[0], "-Djava.class.path=(null)" + sep + "emu57.jar");
     EXPECT_EQ(options[6], "-Djava.library.path=(null)");
 
     // Each option is formatted into 1024 bytes: longer ones are cut at 1023.

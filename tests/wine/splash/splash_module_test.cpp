@@ -93,7 +93,6 @@ std::vector<DWORD> Colours(HWND window) {
 
 SplashParams Params(const char* resource) {
     SplashParams params = {};
-    params.hInstance = params.hResourceModule = GetModuleHandleW(nullptr);
     params.resourceName = resource;
     params.displayMs = 20000;
     params.centerOnScreen = 1;

@@ -1,0 +1,45 @@
+// The error box and the string table on POSIX systems. The texts are built in; a box is always one
+// line on standard error ("caption: text"), and where there is a display also a dialog of our own
+// that the launch waits for, as it waits for a message box on Windows.
+#include "messages.h"
+
+#include <stdio.h>
+#include <string.h>
+
+namespace {
+
+struct MessageText {
+    int32_t id;
+    const char* text;
+};
+
+const MessageText kMessages[] = {
+    {kMessageVmLibraryNotLoaded,
+     "The Java runtime could not be loaded from jre/lib/server/libjvm.so in the application folder. Please "
+     "reinstall QZ-Lumiscope QZ-57."},
+    {kMessageMainClassNotCalled,
+     "The application could not be started: its main class com.qz.kpo.emu57.app.ApplicationMainForm was not "
+     "found in emu57.jar. Please reinstall QZ-Lumiscope QZ-57."},
+    {kMessageVmNotCreated,
+     "The Java virtual machine could not be created. Please check that enough memory is free and reinstall "
+     "QZ-Lumiscope QZ-57 if the problem persists."},
+    {kMessageCaption, "QZ-Lumiscope QZ-57"},
+};
+
+}  // namespace
+
+char* LoadMessageText(int32_t id) {
+    for (const MessageText& message : kMessages) {
+        if (message.id == id) return strdup(message.text);
+    }
+    return nullptr;
+}
+
+void ShowErrorBox(const char* text) {
+    const char* caption = LoadMessageText(kMessageCaption);
+    if (caption == nullptr) caption = "Error";
+    if (text == nullptr) text = "";
+    fprintf(stderr, "%s: %s\n", caption, text);
+    fflush(stderr);
+    ShowErrorDialog(caption, text);
+}
