@@ -1,12 +1,17 @@
 # One-command entry points. `make deps` installs the toolchain on a fresh Debian 12 machine (root).
-#   make dist   build the launcher for i686 and x86_64 into ready application layouts under dist/
-#   make test   build everything and run every test (host, then Wine on each available architecture)
+#   make demo   build the Linux launcher, its private runtime and the demo application, and run the
+#               demo for real (on your display, else on a private Xvfb); screenshots in demo-out/
+#   make dist   ready application layouts under dist/: linux-x86_64 (runs the demo application),
+#               i686 and x86_64 (Windows; their runtime slot holds the test stand-in VM)
+#   make test   build everything and run every test (host unit tests, the scenario table on Linux
+#               with the real JVM, and under Wine on each architecture this machine can run)
 #   make size   print the size report of the release launchers
 BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?= -G Ninja -DCMAKE_BUILD_TYPE=Release
+LINUX_DIST = dist/linux-x86_64
 
-.PHONY: all deps dist test size clean configure-i686 configure-x86_64 configure-host
+.PHONY: all deps demo dist dist-linux dist-windows test size clean
 
 all: dist
 
@@ -17,20 +22,29 @@ $(BUILD)/i686/build.ninja:
 	cmake -S . -B $(BUILD)/i686 $(CMAKE_FLAGS) -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-w64-mingw32.cmake
 $(BUILD)/x86_64/build.ninja:
 	cmake -S . -B $(BUILD)/x86_64 $(CMAKE_FLAGS) -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-x86_64-w64-mingw32.cmake
-$(BUILD)/host/build.ninja:
-	cmake -S . -B $(BUILD)/host $(CMAKE_FLAGS)
+$(BUILD)/linux/build.ninja:
+	cmake -S . -B $(BUILD)/linux $(CMAKE_FLAGS)
 
-dist: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja
+dist-linux: $(BUILD)/linux/build.ninja
+	cmake --build $(BUILD)/linux -j $(JOBS) --target launcher
+	bash tools/make-dist.sh linux $(BUILD) dist
+
+dist-windows: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja
 	cmake --build $(BUILD)/i686 -j $(JOBS) --target launcher vmdouble
 	cmake --build $(BUILD)/x86_64 -j $(JOBS) --target launcher vmdouble
-	bash tools/make-dist.sh $(BUILD) dist
+	bash tools/make-dist.sh windows $(BUILD) dist
+
+dist: dist-linux dist-windows
 	bash tools/size-report.sh $(BUILD)
 
-test: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja $(BUILD)/host/build.ninja
+demo: dist-linux
+	bash tools/demo.sh $(LINUX_DIST) demo-out
+
+test: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja $(BUILD)/linux/build.ninja
 	bash tools/run-tests.sh $(BUILD)
 
 size:
 	bash tools/size-report.sh $(BUILD)
 
 clean:
-	rm -rf $(BUILD) dist
+	rm -rf $(BUILD) dist demo-out
