@@ -32,5 +32,3 @@ bool IsFrameClassName(const char16_t* className, bool javaToolkitClass) {
     if (Utf16CompareNoCase(className, kFrameClassName) == 0) return true;
     return javaToolkitClass && Utf16CompareNoCase(className, kJavaToolkitClassName) == 0;
 }
-
-// The forwarding's portable part (ForwardArguments) belongs below.

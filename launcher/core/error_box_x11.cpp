@@ -1,0 +1,247 @@
+// The launcher's error box on an X display: a small modal dialog of our own in plain Xlib (no
+// toolkit to depend on), the caption as its title, the text wrapped into lines, and an OK button.
+// Enter, Escape, a click on OK or the window manager's close button dismiss it; the launch waits.
+//
+// Main thread only, on a connection of its own (the splash thread may be running on another).
+// Nothing here may stall the launch for good: a lost connection ends the dialog at once.
+#include "messages.h"
+
+#include <X11/Xatom.h>
+#include <X11/Xlib.h>
+#include <X11/Xutil.h>
+#include <X11/keysym.h>
+#include <poll.h>
+#include <stdlib.h>
+#include <string.h>
+
+namespace {
+
+enum { kMaxLineUnits = 60, kMaxLines = 40, kMargin = 16, kMinWidth = 320, kButtonWidth = 80, kButtonHeight = 26 };
+
+struct DialogLine {
+    const char16_t* start;
+    int units;
+};
+
+Display* volatile gDisplay = nullptr;
+volatile bool gXFailed = false;
+volatile bool gConnectionLost = false;
+XErrorHandler gPreviousErrorHandler = nullptr;
+XIOErrorHandler gPreviousIoHandler = nullptr;
+
+// The process-wide Xlib error handler claims only the dialog connection's errors and hands the
+// others (the splash thread's, the Java toolkit's) to the handler it replaced.
+int RecordXError(Display* display, XErrorEvent* error) {
+    if (display == gDisplay) {
+        gXFailed = true;
+        return 0;
+    }
+    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
+}
+
+// A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
+// (its default one exits), then the connection's own exit handler (its default one exits too); ours
+// both return for our connection, so Xlib gives up on it quietly and the dialog ends.
+int QuietIoError(Display* display) {
+    if (display != gDisplay) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
+    gConnectionLost = true;
+    return 0;
+}
+void RecordIoError(Display*, void*) { gConnectionLost = true; }
+
+// The text as UTF-16 (narrow text is UTF-8 here; bytes that are not are shown as Latin-1).
+char16_t* WidenText(const char* text) {
+    char16_t* wide = WideCopy(text);
+    if (wide != nullptr) return wide;
+    size_t n = strlen(text);
+    wide = static_cast<char16_t*>(malloc((n + 1) * sizeof(char16_t)));
+    for (size_t i = 0; wide != nullptr && i <= n; ++i) wide[i] = static_cast<unsigned char>(text[i]);
+    return wide;
+}
+
+// Breaks `text` at line ends, and at the last space before kMaxLineUnits (mid-word when there is
+// none). Returns the number of lines, at most kMaxLines; the rest of a longer text is left out.
+int WrapText(const char16_t* text, DialogLine* lines) {
+    int count = 0;
+    const char16_t* p = text;
+    while (*p != 0 && count < kMaxLines) {
+        int end = 0;
+        int lastSpace = -1;
+        while (p[end] != 0 && p[end] != u'\n' && end < kMaxLineUnits) {
+            if (p[end] == u' ') lastSpace = end;
+            ++end;
+        }
+        int next = end;
+        if (p[end] == u'\n') ++next;
+        else if (p[end] != 0 && lastSpace > 0) end = lastSpace, next = lastSpace + 1;
+        if (end > 0 && p[end - 1] == u'\r') --end;
+        lines[count].start = p;
+        lines[count].units = end;
+        ++count;
+        p += next;
+    }
+    return count;
+}
+
+// Draws `units` characters as two-byte glyph indices: a Unicode font takes them all, a Latin-1
+// font those below U+0100, anything else shows as '?'.
+void DrawText16(Display* display, Window window, GC gc, XFontStruct* font, int x, int y, const char16_t* text,
+                int units) {
+    XChar2b glyphs[kMaxLineUnits];
+    if (units > kMaxLineUnits) units = kMaxLineUnits;
+    for (int i = 0; i < units; ++i) {
+        unsigned c = text[i];
+        if (c < 0x20 || (c >= 0xD800 && c <= 0xDFFF) || (c > 0xFF && font->max_byte1 == 0)) c = '?';
+        glyphs[i].byte1 = static_cast<unsigned char>(c >> 8);
+        glyphs[i].byte2 = static_cast<unsigned char>(c & 0xFF);
+    }
+    XDrawString16(display, window, gc, x, y, glyphs, units);
+}
+
+Atom Intern(Display* display, const char* name) { return XInternAtom(display, name, False); }
+
+void SetAtomProperty(Display* display, Window window, const char* name, const char* value) {
+    Atom atom = Intern(display, value);
+    XChangeProperty(display, window, Intern(display, name), XA_ATOM, 32, PropModeAppend,
+                    reinterpret_cast<unsigned char*>(&atom), 1);
+}
+
+// The dialog from creation to dismissal; true when it was shown.
+bool RunDialog(Display* display, XFontStruct* font, const char* caption, const DialogLine* lines, int lineCount) {
+    int screen = DefaultScreen(display);
+    Window root = RootWindow(display, screen);
+    int lineHeight = font->ascent + font->descent + 2;
+    int textWidth = 0;
+    for (int i = 0; i < lineCount; ++i) {
+        if (lines[i].units * font->max_bounds.width > textWidth) textWidth = lines[i].units * font->max_bounds.width;
+    }
+    int width = textWidth + 2 * kMargin < kMinWidth ? kMinWidth : textWidth + 2 * kMargin;
+    int height = kMargin + lineCount * lineHeight + kMargin + kButtonHeight + kMargin;
+    int x = (DisplayWidth(display, screen) - width) / 2;
+    int y = (DisplayHeight(display, screen) - height) / 2;
+    XRectangle button = {static_cast<short>((width - kButtonWidth) / 2),
+                         static_cast<short>(height - kMargin - kButtonHeight), kButtonWidth, kButtonHeight};
+
+    XSetWindowAttributes attributes;
+    attributes.background_pixel = WhitePixel(display, screen);
+    attributes.event_mask = ExposureMask | KeyPressMask | ButtonPressMask | ButtonReleaseMask | StructureNotifyMask;
+    Window window = XCreateWindow(display, root, x, y, static_cast<unsigned>(width), static_cast<unsigned>(height), 0,
+                                  CopyFromParent, InputOutput, CopyFromParent, CWBackPixel | CWEventMask, &attributes);
+
+    // Title (UTF-8 in both name properties), class, fixed size and centred place, focus and close.
+    Atom utf8 = Intern(display, "UTF8_STRING");
+    int captionBytes = static_cast<int>(strlen(caption));
+    const unsigned char* captionData = reinterpret_cast<const unsigned char*>(caption);
+    XChangeProperty(display, window, XA_WM_NAME, utf8, 8, PropModeReplace, captionData, captionBytes);
+    XChangeProperty(display, window, Intern(display, "_NET_WM_NAME"), utf8, 8, PropModeReplace, captionData,
+                    captionBytes);
+    // Not a frame class, so a second instance's activation never picks the dialog.
+    char className[] = "QZ-Lumiscope_QZ-57";
+    XClassHint classHint = {className, className};
+    XSetClassHint(display, window, &classHint);
+    XSizeHints size;
+    size.flags = USPosition | PPosition | PMinSize | PMaxSize | PWinGravity;
+    size.x = x;
+    size.y = y;
+    size.min_width = size.max_width = width;
+    size.min_height = size.max_height = height;
+    size.win_gravity = CenterGravity;  // the frame is centred, not just the client area
+    XSetWMNormalHints(display, window, &size);
+    XWMHints wmHints;
+    wmHints.flags = InputHint;
+    wmHints.input = True;
+    XSetWMHints(display, window, &wmHints);
+    Atom closeProtocol = Intern(display, "WM_DELETE_WINDOW");
+    XSetWMProtocols(display, window, &closeProtocol, 1);
+    SetAtomProperty(display, window, "_NET_WM_WINDOW_TYPE", "_NET_WM_WINDOW_TYPE_DIALOG");
+    SetAtomProperty(display, window, "_NET_WM_STATE", "_NET_WM_STATE_ABOVE");  // on top, as the Windows box
+    GC gc = XCreateGC(display, window, 0, nullptr);
+    XSetFont(display, gc, font->fid);
+    XMapRaised(display, window);
+    XSync(display, False);
+    bool shown = false;
+    bool done = gXFailed || gConnectionLost;  // the window could not be made
+    bool pressedOnButton = false;
+    while (!done) {
+        while (!done && !gConnectionLost && XPending(display) > 0) {
+            XEvent event;
+            XNextEvent(display, &event);
+            if (event.type == MapNotify && !shown) {
+                shown = true;
+                // Ask the window manager for the focus, as a pager would, and take it where there is none.
+                XEvent active = {};
+                active.xclient.type = ClientMessage;
+                active.xclient.window = window;
+                active.xclient.message_type = Intern(display, "_NET_ACTIVE_WINDOW");
+                active.xclient.format = 32;
+                active.xclient.data.l[0] = 2;
+                XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &active);
+                XSetInputFocus(display, window, RevertToParent, CurrentTime);
+            } else if (event.type == Expose && event.xexpose.count == 0) {
+                XClearWindow(display, window);
+                XSetForeground(display, gc, BlackPixel(display, screen));
+                for (int i = 0; i < lineCount; ++i) {
+                    DrawText16(display, window, gc, font, kMargin, kMargin + i * lineHeight + font->ascent,
+                               lines[i].start, lines[i].units);
+                }
+                XDrawRectangle(display, window, gc, button.x, button.y, button.width - 1, button.height - 1);
+                static const char16_t kOk[] = u"OK";
+                DrawText16(display, window, gc, font, button.x + (button.width - 2 * font->max_bounds.width) / 2,
+                           button.y + (button.height + font->ascent - font->descent) / 2, kOk, 2);
+            } else if (event.type == KeyPress && !event.xkey.send_event) {
+                KeySym key = XLookupKeysym(&event.xkey, 0);
+                done = key == XK_Return || key == XK_KP_Enter || key == XK_Escape;
+            } else if ((event.type == ButtonPress || event.type == ButtonRelease) && event.xbutton.button == Button1) {
+                bool onButton = event.xbutton.x >= button.x && event.xbutton.x < button.x + button.width &&
+                                event.xbutton.y >= button.y && event.xbutton.y < button.y + button.height;
+                if (event.type == ButtonPress) pressedOnButton = onButton;
+                else done = pressedOnButton && onButton;
+            } else if (event.type == ClientMessage && event.xclient.format == 32 &&
+                       event.xclient.message_type == Intern(display, "WM_PROTOCOLS")) {
+                done = static_cast<Atom>(event.xclient.data.l[0]) == closeProtocol;  // the close button
+            } else if (event.type == DestroyNotify) {
+                done = true;  // someone else destroyed it
+            }
+        }
+        if (gConnectionLost) break;
+        XFlush(display);
+        pollfd fd = {ConnectionNumber(display), POLLIN, 0};
+        if (!done) poll(&fd, 1, -1);
+    }
+    if (!gConnectionLost) {
+        XFreeGC(display, gc);
+        XDestroyWindow(display, window);
+        XSync(display, False);
+    }
+    return shown;
+}
+
+}  // namespace
+
+bool ShowErrorDialog(const char* caption, const char* text) {
+    XInitThreads();
+    Display* display = XOpenDisplay(nullptr);
+    if (display == nullptr) return false;
+    gDisplay = display;
+    gXFailed = gConnectionLost = false;
+    XSetIOErrorExitHandler(display, RecordIoError, nullptr);
+    XErrorHandler previous = XSetErrorHandler(RecordXError);
+    if (previous != RecordXError) gPreviousErrorHandler = previous;
+    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
+    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
+
+    // A Unicode face of the core "fixed" font where the server has one, else "fixed" itself.
+    XFontStruct* font = XLoadQueryFont(display, "-misc-fixed-medium-r-semicondensed--13-*-*-*-*-*-iso10646-1");
+    if (font == nullptr) font = XLoadQueryFont(display, "fixed");
+    char16_t* wide = WidenText(text != nullptr ? text : "");
+    bool shown = false;
+    if (font != nullptr && wide != nullptr) {
+        DialogLine lines[kMaxLines];
+        shown = RunDialog(display, font, caption != nullptr ? caption : "Error", lines, WrapText(wide, lines));
+    }
+    free(wide);
+    if (font != nullptr && !gConnectionLost) XFreeFont(display, font);
+    XCloseDisplay(display);
+    gDisplay = nullptr;
+    return shown;
+}

@@ -1,0 +1,183 @@
+// Activation of the running application's frame under X11: the second instance walks the window
+// manager's client list (or, with no window manager, the root's children) and restores and raises
+// every window that passes the tests of the Windows search, in the same order: not withdrawn, a
+// title, the byte-wise title test, a class, the class test.
+//
+// Main thread only, on a connection of its own that is closed before returning. Nothing here may
+// stall the second instance: a window that vanishes mid-walk only fails its own tests, and a lost
+// connection ends the walk.
+#include "instance.h"
+
+#include <X11/Xatom.h>
+#include <X11/Xlib.h>
+#include <X11/Xutil.h>
+#include <stdlib.h>
+#include <unistd.h>
+
+namespace {
+
+const size_t kClassUnits = 1024;  // the most of a class name that is compared
+const int kActivationChecks = 25;
+const useconds_t kActivationCheckUs = 10000;
+
+Display* volatile gDisplay = nullptr;
+volatile bool gConnectionLost = false;
+XErrorHandler gPreviousErrorHandler = nullptr;
+XIOErrorHandler gPreviousIoHandler = nullptr;
+
+// The process-wide Xlib error handler ignores our own connection's errors (a window that went away
+// mid-walk: BadWindow; the call that met it fails and the window fails its test) and hands the
+// others on to the handler it replaced.
+int IgnoreXError(Display* display, XErrorEvent* error) {
+    if (display == gDisplay) return 0;
+    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
+}
+
+// A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
+// (its default one exits), then the connection's own exit handler (its default one exits too); ours
+// both return for our connection, so Xlib gives up on it quietly and the walk ends.
+int QuietIoError(Display* display) {
+    if (display != gDisplay) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
+    gConnectionLost = true;
+    return 0;
+}
+void RecordIoError(Display*, void*) { gConnectionLost = true; }
+
+// The first 32-bit item of property `name` of type `type` (both by name), or 0.
+long FirstItem(Display* display, Window window, const char* name, const char* type) {
+    Atom actualType = None;
+    int format = 0;
+    unsigned long count = 0;
+    unsigned long after = 0;
+    unsigned char* data = nullptr;
+    long item = 0;
+    if (XGetWindowProperty(display, window, XInternAtom(display, name, False), 0, 1, False,
+                           XInternAtom(display, type, False), &actualType, &format, &count, &after, &data) == Success &&
+        format == 32 && count > 0) {
+        item = reinterpret_cast<long*>(data)[0];
+    }
+    if (data != nullptr) XFree(data);
+    return item;
+}
+
+// Text property `name` of `window` as a heap copy in UTF-16, or null. Xlib's converter takes
+// UTF8_STRING, STRING (Latin-1, as Java writes WM_NAME) and COMPOUND_TEXT alike.
+char16_t* ReadText(Display* display, Window window, Atom name) {
+    XTextProperty property;
+    if (XGetTextProperty(display, window, &property, name) == 0) return nullptr;
+    char** list = nullptr;
+    int count = 0;
+    char16_t* text = nullptr;
+    if (property.nitems > 0 && Xutf8TextPropertyToTextList(display, &property, &list, &count) >= Success &&
+        count > 0) {
+        text = WideCopy(list[0]);
+    }
+    if (list != nullptr) XFreeStringList(list);
+    XFree(property.value);
+    return text;
+}
+
+// The window test, in the order of the Windows search, and for a window that passes its restoring
+// and activation. `managed`: the window came from a window manager's client list.
+void ActivateIfFrame(Display* display, Window root, Window window, bool managed) {
+    long state = 0;
+    if (managed) {  // WM_STATE 1 normal, 3 iconic; none or 0 is withdrawn (hidden)
+        state = FirstItem(display, window, "WM_STATE", "WM_STATE");
+        if (state != NormalState && state != IconicState) return;
+    } else {
+        XWindowAttributes attributes;
+        if (XGetWindowAttributes(display, window, &attributes) == 0 || attributes.map_state != IsViewable) return;
+    }
+    char16_t* title = ReadText(display, window, XInternAtom(display, "_NET_WM_NAME", False));
+    if (title == nullptr || title[0] == 0) {
+        free(title);
+        title = ReadText(display, window, XA_WM_NAME);
+    }
+    bool named = title != nullptr && title[0] != 0 && TitleHoldsInstanceName(title);
+    free(title);
+    if (!named) return;
+
+    XClassHint hint = {nullptr, nullptr};
+    if (XGetClassHint(display, window, &hint) == 0) return;
+    char16_t className[kClassUnits + 1];
+    size_t n = 0;
+    for (const char* c = hint.res_class; c != nullptr && *c != 0 && n < kClassUnits; ++c) {
+        className[n++] = static_cast<unsigned char>(*c);  // ICCCM's Latin-1, byte by byte
+    }
+    className[n] = 0;
+    XFree(hint.res_name);
+    XFree(hint.res_class);
+    if (n == 0 || !IsFrameClassName(className, true)) return;
+
+    if (!managed) {
+        XMapRaised(display, window);
+        XSetInputFocus(display, window, RevertToParent, CurrentTime);
+        return;
+    }
+    // Mapping an iconic client window asks the window manager for the normal state (ICCCM 4.1.4);
+    // the activation request then deiconifies it too under managers that want it that way.
+    if (state == IconicState) XMapWindow(display, window);
+    XEvent event = {};
+    event.xclient.type = ClientMessage;
+    event.xclient.window = window;
+    event.xclient.message_type = XInternAtom(display, "_NET_ACTIVE_WINDOW", False);
+    event.xclient.format = 32;
+    event.xclient.data.l[0] = 2;  // source: a pager, i.e. at the user's request; window managers honour it
+    event.xclient.data.l[1] = CurrentTime;
+    XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &event);
+    // Wait (a little, never for good) until the manager has made it the active window, so that the
+    // next window's activation cannot overtake this one and the last one really ends in front.
+    for (int i = 0; i < kActivationChecks; ++i) {
+        if (static_cast<Window>(FirstItem(display, root, "_NET_ACTIVE_WINDOW", "WINDOW")) == window) break;
+        usleep(kActivationCheckUs);
+    }
+}
+
+}  // namespace
+
+void ActivateRunningInstances() {
+    XInitThreads();
+    Display* display = XOpenDisplay(nullptr);
+    if (display == nullptr) return;
+    gDisplay = display;
+    gConnectionLost = false;
+    XSetIOErrorExitHandler(display, RecordIoError, nullptr);
+    XErrorHandler previous = XSetErrorHandler(IgnoreXError);
+    if (previous != IgnoreXError) gPreviousErrorHandler = previous;
+    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
+    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
+
+    // The window manager's client list when a live EWMH manager (its check window names itself)
+    // keeps one; otherwise the root's children, stacked bottom to top.
+    Window root = DefaultRootWindow(display);
+    Window check = static_cast<Window>(FirstItem(display, root, "_NET_SUPPORTING_WM_CHECK", "WINDOW"));
+    bool managed = check != None &&
+                   static_cast<Window>(FirstItem(display, check, "_NET_SUPPORTING_WM_CHECK", "WINDOW")) == check;
+    Atom type = None;
+    int format = 0;
+    unsigned long count = 0;
+    unsigned long after = 0;
+    unsigned char* list = nullptr;
+    if (managed && (XGetWindowProperty(display, root, XInternAtom(display, "_NET_CLIENT_LIST", False), 0, 1 << 16,
+                                       False, XA_WINDOW, &type, &format, &count, &after, &list) != Success ||
+                    format != 32)) {
+        managed = false;
+    }
+    Window* windows = reinterpret_cast<Window*>(list);
+    Window* children = nullptr;
+    if (!managed) {
+        Window parent = None;
+        unsigned int n = 0;
+        count = XQueryTree(display, root, &root, &parent, &children, &n) != 0 ? n : 0;
+        windows = children;
+    }
+    for (unsigned long i = 0; i < count && !gConnectionLost; ++i) {
+        ActivateIfFrame(display, root, windows[i], managed);
+        XSync(display, False);  // a vanished window's late errors arrive here, not with the next one
+    }
+    if (list != nullptr) XFree(list);
+    if (children != nullptr) XFree(children);
+    XSync(display, False);
+    XCloseDisplay(display);
+    gDisplay = nullptr;
+}
