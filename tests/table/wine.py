@@ -14,6 +14,7 @@ from conftest import Record
 
 ROOT = Path(__file__).resolve().parents[2]
 EXE = "QZ-Lumiscope_QZ-57.exe"
+UNUSABLE = "C:\\windows\\system32\\kernel32.dll\\missing"  # a folder that can neither exist nor be made
 LOG = "QZ-LumiscopeQZ-57Nova/logs/QZ-LumiscopeQZ-57Nova-L.log"
 
 
@@ -34,7 +35,7 @@ class App:
         return Record(file.read_bytes()) if file.exists() else None
 
 
-class Wine:
+class Platform:
     def __init__(self, arch, build):
         self.name, self.build = f"wine-{arch}", (ROOT / build / arch).resolve()
         self.state, self.counter = self.build / "table-bed", itertools.count()
@@ -78,31 +79,26 @@ class Wine:
         file = self.docs / LOG
         return file.read_bytes() if file.exists() else None
 
-    def reset_log(self, how):
-        folder = (self.docs / LOG).parent
-        if how == "junk":
-            folder.mkdir(parents=True, exist_ok=True)
-            (folder / Path(LOG).name).write_bytes(b"x" * 65536)
-        elif how == "nofolder":
-            shutil.rmtree(folder, ignore_errors=True)
-
     def run(self, app, args=(), **inputs):
         return self.start(app, args, **inputs).finish()
 
     def start(self, app, args=(), argv0=None, cwd=None, lock=False, listener=None, folders=None, windows=(),
               debug=False, splash=False, log="junk", timeout=120):
-        self.reset_log(log)
+        folder = (self.docs / LOG).parent
+        if log == "nofolder":
+            shutil.rmtree(folder, ignore_errors=True)
+        elif log == "junk":
+            folder.mkdir(parents=True, exist_ok=True)
+            (self.docs / LOG).write_bytes(b"x" * 65536)
         argv0 = argv0.exe if isinstance(argv0, App) else argv0 or app.exe
         probe = [self.env["WINE"], str(self.build / "tests/wine/probe.exe"), "exe=" + hexunits(app.exe),
-                 "cmd=" + hexunits(subprocess.list2cmdline([argv0, *args])),
-                 "cwd=" + hexunits(app.native if cwd == "app" else "C:\\windows"), f"timeout={timeout * 1000}"]
+                 "cmd=" + hexunits(subprocess.list2cmdline([argv0, *args])), f"timeout={timeout * 1000}",
+                 "cwd=" + hexunits(app.native if cwd == "app" else "C:\\windows")]
         probe += ["lock=1"] * lock + ["debug=1"] * debug + ["splash_wait=3000"] * splash
         for name, path in (folders or {}).items():
-            if path is None:  # a folder that neither exists nor can be created
-                path = "C:\\windows\\system32\\kernel32.dll\\missing"
-            else:
+            if path:
                 (self.drive_c / path[3:].replace("\\", "/")).mkdir(parents=True, exist_ok=True)
-            probe.append("folder=" + hexunits(f"{name}={path}"))
+            probe.append("folder=" + hexunits(f"{name}={path or UNUSABLE}"))
         probe += ["window=" + hexunits(",".join(w)) for w in windows]
         if listener:
             listener.start()
@@ -115,13 +111,11 @@ class Running:
     def __init__(self, wine, app, process, output, listener, timeout):
         self.wine, self.app, self.process, self.output, self.listener, self.timeout = wine, app, process, output, listener, timeout
 
-    def wait_main(self, seconds=60):
-        for _ in range(seconds * 10):
-            record = self.app.record()
-            if record and any(line.startswith("main ") for line in record.lines):
+    def wait_main(self):
+        for _ in range(600):
+            if any(line.startswith("main ") for line in (self.app.record() or Record(b"")).lines):
                 return True
             time.sleep(0.1)
-        return False
 
     def stop(self):
         (self.app.path / "stop").write_bytes(b"")
@@ -134,12 +128,10 @@ class Running:
         self.output.seek(0)
         events = [json.loads(line) for line in self.output.read().splitlines() if line.startswith("{")]
         of = lambda kind: [e for e in events if e["ev"] == kind]
-        exit, = of("exit")
-        gone = of("splash_gone")
-        splash = {**of("splash")[0], "gone": gone[0]["t"], "alphas": gone[0]["alphas"]} if gone else None
+        (exit,), (screen,), seen, gone = of("exit"), of("screen"), of("splash"), of("splash_gone")
         return SimpleNamespace(
-            code=exit["code"], killed=exit["killed"], elapsed=exit["t"], stdout=exit["stdout"],
-            boxes=[SimpleNamespace(**b) for b in of("box")], splash=splash, screen=(of("screen")[0]["w"], of("screen")[0]["h"]),
-            windows=of("window"), record=self.app.record(), log=self.wine.read_log(),
-            log_folder=(self.wine.docs / LOG).parent.exists(),
-            received=self.listener.received if self.listener else None, listener=self.listener)
+            code=exit["code"], killed=exit["killed"], elapsed=exit["t"], stdout=exit["stdout"], screen=(screen["w"], screen["h"]),
+            boxes=[SimpleNamespace(**b) for b in of("box")], windows=of("window"), record=self.app.record(),
+            splash={**seen[0], "gone": gone[0]["t"], "alphas": gone[0]["alphas"]} if seen else None,
+            log=self.wine.read_log(), log_folder=(self.wine.docs / LOG).parent.exists(), listener=self.listener,
+            received=self.listener.received if self.listener else None)

@@ -4,7 +4,6 @@
 #   bed.sh setup STATE       make STATE/{prefix,home,tmp}, start Xvfb (+ a compositor) and a
 #                            persistent wineserver, initialise the prefix for unattended runs
 #   bed.sh run STATE CMD...  run a Windows program in that prefix (exit code passed through)
-#   bed.sh env STATE         print the environment (to `source` by hand)
 #   bed.sh teardown STATE    stop everything and remove STATE
 #
 # Unattended means: no window manager, so windows are unmanaged (boxes close at once); no crash
@@ -86,7 +85,6 @@ case "$action" in
     wineserver -p </dev/null >/dev/null 2>&1
     timeout 120 $WINE wineboot.exe </dev/null >/dev/null 2>&1
     exec $WINE "$@" ;;
-  env) cat "$state/env.sh" ;;
   teardown)
     if [ -f "$state/env.sh" ]; then
       # shellcheck disable=SC1091
