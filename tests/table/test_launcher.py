@@ -135,8 +135,8 @@ ROWS = [
     Row("hand-off-dropped-early", ["-x", "\u4e2d" * 3000, "y" * 3000], run=dict(lock=True, listener=8), boxes=[],
         received="002d0078"),
     Row("activation", run=dict(lock=True, listener=True, windows=[
-        ("i", FRAME, LOCK_UNITS), ("z", FRAME, "XX" + LOCK_UNITS),                     # raised
-        ("h", FRAME, LOCK_UNITS + "1A"), ("i", FRAME, "qz" + LOCK_UNITS[1:]),          # hidden; case differs
+        ("i", FRAME, LOCK_UNITS), ("z", FRAME, "\u5858" + LOCK_UNITS),                # raised
+        ("h", FRAME, LOCK_UNITS + "1A"), ("i", FRAME, "\u7a71" + LOCK_UNITS[1:]),      # hidden; "qz-Lumi..."
         ("i", FRAME, "QZ-Lumiscope_QZ-57"), ("i", FRAME, "A" + LOCK_UNITS),            # one byte per unit
         ("i", FRAME, ""), ("i", FRAME + "X", LOCK_UNITS + "2A"), ("i", FRAME[:-1], LOCK_UNITS + "3A")]),
         only="wine"),
