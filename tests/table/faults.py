@@ -1,6 +1,6 @@
 """Planted faults: small patches to the launcher, each of which some rows of the table must catch.
-    /usr/bin/python3 tests/table/faults.py      builds each in a scratch copy (x86_64), runs the rows
-                                                 that can reach it, prints "N of N caught" """
+    /usr/bin/python3 tests/table/faults.py [NAME-PART...]   builds each (or those named) in a scratch copy
+                                        (x86_64), runs the rows that can reach it, prints "N of N caught" """
 import re
 import shutil
 import subprocess
@@ -51,7 +51,8 @@ FAULTS = [  # name, rows (pytest -k), [(file under launcher/, old, new)]
 ]
 
 
-def main(scratch=Path("/tmp/planted-faults")):
+def main(names, scratch=Path("/tmp/planted-faults")):
+    faults = [f for f in FAULTS if not names or any(n in f[0] for n in names)]
     shutil.rmtree(scratch, ignore_errors=True)
     shutil.copytree(Path(__file__).resolve().parents[2], scratch, ignore=shutil.ignore_patterns("build", "dist", ".git"))
     build, quiet = scratch / "build/x86_64", dict(stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
@@ -59,7 +60,7 @@ def main(scratch=Path("/tmp/planted-faults")):
                     f"-DCMAKE_TOOLCHAIN_FILE={scratch}/cmake/toolchain-x86_64-w64-mingw32.cmake"], check=True, **quiet)
     subprocess.run(["cmake", "--build", build], check=True, **quiet)
     caught = 0
-    for name, rows, edits in FAULTS:
+    for name, rows, edits in faults:
         originals = {}
         for file, old, new in edits:
             path = scratch / "launcher" / file
@@ -75,9 +76,9 @@ def main(scratch=Path("/tmp/planted-faults")):
         print(f"{name}: " + ("caught by " + ", ".join(failed) if failed else "NOT CAUGHT" if built else "does not build"), flush=True)
         for path, text in originals.items():
             path.write_text(text)
-    print(f"{caught} of {len(FAULTS)} caught")
-    return caught == len(FAULTS)
+    print(f"{caught} of {len(faults)} caught")
+    return caught == len(faults)
 
 
 if __name__ == "__main__":
-    sys.exit(0 if main() else 1)
+    sys.exit(0 if main(sys.argv[1:]) else 1)
