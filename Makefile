@@ -5,13 +5,14 @@
 #               i686 and x86_64 (Windows; their runtime slot holds the test stand-in VM)
 #   make test   build everything and run every test (host unit tests, the scenario table on Linux
 #               with the real JVM, and under Wine on each architecture this machine can run)
+#   make bench  start-up figures beside the alternatives (docs/performance.md)
 #   make size   print the size report of the release launchers
 BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?= -G Ninja -DCMAKE_BUILD_TYPE=Release
 LINUX_DIST = dist/linux-x86_64
 
-.PHONY: all deps demo dist dist-linux dist-windows test size clean
+.PHONY: all deps demo dist dist-linux dist-windows test bench size clean
 
 all: dist
 
@@ -42,6 +43,11 @@ demo: dist-linux
 
 test: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja $(BUILD)/linux/build.ninja
 	bash tools/run-tests.sh $(BUILD)
+
+# Start-up figures (not a test): writes docs/performance.md and docs/performance.png.
+bench: dist-linux $(BUILD)/x86_64/build.ninja
+	cmake --build $(BUILD)/x86_64 -j $(JOBS) --target launcher vmdouble
+	/usr/bin/python3 tools/bench/bench.py --build $(BUILD)
 
 size:
 	bash tools/size-report.sh $(BUILD)

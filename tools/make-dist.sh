@@ -4,9 +4,9 @@
 #                                    and jre/ (a private runtime made with jlink); ready to copy and run
 #   make-dist.sh windows BUILD OUT   OUT/<arch>: the launcher, jre\bin\client\jvm.dll, emu57.jar
 # No Windows Java runtime can be built here, so the Windows runtime slot holds the test stand-in VM
-# (it records what the launcher hands it and lets `main` run for three seconds); the layout says so
-# in jre/STAND-IN.txt. Put a real Windows Java runtime in jre\ and the application in emu57.jar to
-# run the real application.
+# (tests/wine/vmdouble.cpp, which records what the launcher hands it in vm-record.txt and lets
+# `main` run for three seconds); jre\README.txt says so. Replace dist/<arch>/jre with a real
+# Windows Java runtime (and emu57.jar with the application) to run the real application.
 set -eu
 what=$1; build=${2:-build}; out=${3:-dist}
 here=$(cd "$(dirname "$0")" && pwd)
@@ -23,11 +23,13 @@ case "$what" in
       dir="$out/$arch"
       rm -rf "$dir"; mkdir -p "$dir/jre/bin/client"
       cp "$build/$arch/launcher/QZ-Lumiscope_QZ-57.exe" "$dir/"
-      cp "$build/$arch/tests/wine/jvm.dll" "$dir/jre/bin/client/jvm.dll" 2>/dev/null ||
-        cp "$build/$arch/tests/wine/vmdouble/jvm.dll" "$dir/jre/bin/client/jvm.dll"
-      printf 'This jvm.dll is a test stand-in, not a Java runtime: it records what the launcher hands it\nand lets main run for three seconds. Replace jre\\ with a real Windows Java runtime.\n' >"$dir/jre/STAND-IN.txt"
+      cp "$build/$arch/tests/wine/jvm.dll" "$dir/jre/bin/client/jvm.dll"
+      printf '%s\r\n' "TEST STAND-IN, NOT A JAVA RUNTIME." \
+        "bin\\client\\jvm.dll is the test suite's VM double: it runs no Java code. It records the options" \
+        "and arguments the launcher hands it in ..\\vm-record.txt and lets main run for three seconds" \
+        "(..\\vm-script.txt). Replace this jre folder with a real Windows Java runtime." >"$dir/jre/README.txt"
       : >"$dir/emu57.jar"
-      printf 'main_ms=3000\n' >"$dir/vmdouble.ini"
+      printf 'main_ms=3000\n' >"$dir/vm-script.txt"
       echo "$dir: $(ls "$dir" | tr '\n' ' ')"
     done ;;
   *) echo "usage: make-dist.sh linux|windows BUILD OUT" >&2; exit 2 ;;

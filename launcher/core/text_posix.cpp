@@ -69,7 +69,7 @@ int DecodeUtf8(const char* text, int sourceBytes, char16_t* out, int outUnits) {
         int length = c < 0x80 ? 1 : c < 0xC2 ? 0 : c < 0xE0 ? 2 : c < 0xF0 ? 3 : c < 0xF5 ? 4 : 0;
         int low = c == 0xE0 ? 0xA0 : c == 0xF0 ? 0x90 : 0x80;
         int high = c == 0xED ? 0x9F : c == 0xF4 ? 0x8F : 0xBF;
-        uint32_t cp = length == 1 ? c : c & (0x3F >> (length > 0 ? length : 1));
+        uint32_t cp = length <= 1 ? c : c & (0x7F >> length);  // the lead byte's payload bits
         int taken = 1;
         for (; taken < length; ++taken) {
             int next = byteAt(i + taken);

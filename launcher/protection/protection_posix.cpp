@@ -29,11 +29,9 @@ Status ProtectionCheckImage() {
     uint8_t* image = size > 0 && size < kLargestImage ? static_cast<uint8_t*>(malloc(static_cast<size_t>(size))) : nullptr;
     if (image != nullptr && fseek(file, 0, SEEK_SET) == 0 && fread(image, 1, static_cast<size_t>(size), file) == static_cast<size_t>(size)) {
         // The marker appears once in the file: in the data of imageStamp itself.
-        for (long at = 0; at + static_cast<long>(kMarkerBytes) + 4 <= size; ++at) {
-            if (memcmp(image + at, imageStamp, kMarkerBytes) == 0) {
-                result = VerifyStampedChecksum(image, static_cast<uint32_t>(size), static_cast<uint32_t>(at + kMarkerBytes));
-                break;
-            }
+        const uint8_t* marker = static_cast<const uint8_t*>(memmem(image, static_cast<size_t>(size), imageStamp, kMarkerBytes));
+        if (marker != nullptr) {
+            result = VerifyStampedChecksum(image, static_cast<uint32_t>(size), static_cast<uint32_t>(marker - image + kMarkerBytes));
         }
     }
     free(image);

@@ -17,6 +17,8 @@
 #include <X11/Xutil.h>
 #include <fcntl.h>
 #include <poll.h>
+
+#include <atomic>
 #include <pthread.h>
 #include <stdlib.h>
 #include <time.h>
@@ -28,7 +30,7 @@ namespace {
 // takes kPreparing to kShowing just before it maps the window, SplashClose takes kPreparing to
 // kCancelled; whichever comes first wins, so a window is either never shown or reachable.
 enum : int { kPreparing = 1, kShowing = 2, kCancelled = 3, kEnded = 4 };
-int gState = 0;
+std::atomic<int> gState(0);
 
 // Main thread only.
 bool gThreadStarted = false;
@@ -228,8 +230,7 @@ void ShowSplash(const SplashParams& params) {
     // The display time counts from here, fade included.
     int64_t closeAt = NowMs() + params.displayMs;
     int expected = kPreparing;
-    if (!gXFailed && __atomic_compare_exchange_n(&gState, &expected, kShowing, false, __ATOMIC_SEQ_CST,
-                                                 __ATOMIC_SEQ_CST)) {
+    if (!gXFailed && gState.compare_exchange_strong(expected, kShowing)) {
         XMapWindow(display, window);
         RunSplashLoop(display, window, image, opacity, closeAt);
         XUnmapWindow(display, window);
@@ -243,7 +244,7 @@ void ShowSplash(const SplashParams& params) {
 
 void* SplashThreadProc(void*) {
     ShowSplash(gParams);
-    __atomic_store_n(&gState, kEnded, __ATOMIC_SEQ_CST);
+    gState = kEnded;
     return nullptr;
 }
 
@@ -258,7 +259,10 @@ void JoinSplashThread() {
 }  // namespace
 
 void SplashStart(const SplashParams* params) {
-    if (__atomic_load_n(&gState, __ATOMIC_SEQ_CST) != 0) return;  // one splash per process
+    if (gState != 0) return;  // one splash per process
+    // Without a display there is nothing to show: no thread, no Xlib.
+    const char* display = getenv("DISPLAY");
+    if (display == nullptr || display[0] == 0) return;
     XInitThreads();           // before any other Xlib call: the splash thread and the main thread both use Xlib
     if (pipe2(gWakePipe, O_CLOEXEC | O_NONBLOCK) != 0) return;
     gParams = *params;
@@ -278,7 +282,7 @@ void SplashClose() {
     // Before the window is shown: it never will be, and the thread ends by itself. Nothing is
     // waited for, as the thread may still be opening its display.
     int state = kPreparing;
-    if (__atomic_compare_exchange_n(&gState, &state, kCancelled, false, __ATOMIC_SEQ_CST, __ATOMIC_SEQ_CST)) return;
+    if (gState.compare_exchange_strong(state, kCancelled)) return;
     if (state == kCancelled) return;
     // Shown or ended: wake the loop (it only ever waits in poll) and wait until the window is gone.
     if (state == kShowing) {

@@ -4,7 +4,6 @@
 #   bed.sh setup STATE       make STATE/{prefix,home,tmp}, start Xvfb (+ a compositor) and a
 #                            persistent wineserver, initialise the prefix for unattended runs
 #   bed.sh run STATE CMD...  run a Windows program in that prefix (exit code passed through)
-#   bed.sh env STATE         print the environment (to `source` by hand)
 #   bed.sh teardown STATE    stop everything and remove STATE
 #
 # Unattended means: no window manager, so windows are unmanaged (boxes close at once); no crash
@@ -41,23 +40,16 @@ $(pick_loader)
 ENV
 }
 
-free_display() {
-  local n
-  for n in $(seq 91 199); do
-    if [ ! -e "/tmp/.X11-unix/X$n" ] && [ ! -e "/tmp/.X$n-lock" ]; then echo "$n"; return 0; fi
-  done
-  return 1
-}
-
 setup() {
   "$0" teardown "$state" 2>/dev/null
   mkdir -p "$state/prefix" "$state/home" "$state/tmp"
-  local display
-  display=$(free_display) || { say "no free X display number"; exit 1; }
-  Xvfb ":$display" -screen 0 1280x1024x24 -nolisten tcp >"$state/xvfb.log" 2>&1 </dev/null &
+  # Xvfb picks a free display itself and writes its number once it listens: no race for a number.
+  Xvfb -displayfd 3 -screen 0 1280x1024x24 -nolisten tcp 3>"$state/display" >"$state/xvfb.log" 2>&1 </dev/null &
   echo $! >"$state/xvfb.pid"
-  for _ in $(seq 100); do [ -e "/tmp/.X11-unix/X$display" ] && break; sleep 0.1; done
-  [ -e "/tmp/.X11-unix/X$display" ] || { say "Xvfb did not start"; cat "$state/xvfb.log" >&2; exit 1; }
+  for _ in $(seq 300); do [ -s "$state/display" ] && break; sleep 0.1; done
+  local display
+  display=$(cat "$state/display")
+  [ -n "$display" ] || { say "Xvfb did not start"; cat "$state/xvfb.log" >&2; exit 1; }
   write_env "$display"
   # shellcheck disable=SC1091
   . "$state/env.sh"
@@ -93,7 +85,6 @@ case "$action" in
     wineserver -p </dev/null >/dev/null 2>&1
     timeout 120 $WINE wineboot.exe </dev/null >/dev/null 2>&1
     exec $WINE "$@" ;;
-  env) cat "$state/env.sh" ;;
   teardown)
     if [ -f "$state/env.sh" ]; then
       # shellcheck disable=SC1091

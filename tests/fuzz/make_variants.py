@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-"""Writes the bitmap file images the splash module tests show: make_variants.py OUTPUT_DIR [W H]
+"""Writes the bitmap file images of every kind the splash reads, as fuzz seeds: make_variants.py OUTPUT_DIR [W H]
 
 The drawable ones are 300 x 200 and split into quadrants of four plain colours (top left red, top
 right green, bottom left blue, bottom right yellow; the 1-bit one has only two: red above, blue

@@ -1,0 +1,295 @@
+"""The launcher's behaviour as one table of scenarios: each row gives the inputs of one launch and what
+must come out of it. Rows run on every platform unless `only` names one (platform-specific inputs:
+argv[0], Windows folders, windows on screen, a debugger)."""
+import re
+
+import pytest
+import time
+from dataclasses import dataclass, field
+
+from conftest import Listener, port_free
+
+CAPTION = "QZ-Lumiscope QZ-57"
+REINSTALL = "reinstall QZ-Lumiscope QZ-57"
+VM_NOT_LOADED = f"The Java runtime could not be loaded from jre\\bin\\client\\jvm.dll in the application folder. Please {REINSTALL}."
+MAIN_NOT_CALLED = ("The application could not be started: its main class com.qz.kpo.emu57.app.ApplicationMainForm was not "
+                   f"found in emu57.jar. Please {REINSTALL}.")
+VM_NOT_CREATED = f"The Java virtual machine could not be created. Please check that enough memory is free and {REINSTALL} if the problem persists."
+LOAD_ERROR = "Unexpected Error. Error loading files."
+MAIN = "com/qz/kpo/emu57/app/ApplicationMainForm"
+NO_SPLASH = "-Dapp.lumiscope57.noSplash=true"
+START = [("Preliminary Definitions", 0), ("CL interpretation", 0)]
+END = [("Successful launch end.", 0), "end"]
+LOCK_UNITS = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735"  # "QZ-Lumiscope_QZ-57" read as UTF-16
+FRAME = "COM.QZ.KPO.EMU57.APP.EMULATORFRAME"
+OUTSIDE_ANSI = "C:\\Users\\\u0418\u0432\u0430\u043d\\\u6587\u6863\\\u05e9\u05dc\u05d5\u05dd.qz57"
+# 5,000 units, with a surrogate pair across unit 1,023 (where a fixed 4,096-byte buffer would end).
+LONG = "".join(chr(0x4E00 + i) if i % 7 == 0 else chr(0x41 + i % 26) for i in range(5000))
+LONG = LONG[:1022] + "\U0001F600" + LONG[1024:]
+
+
+def hexed(text):
+    return text.encode("utf-16-be", "surrogatepass").hex()
+
+
+def destroyed(result):
+    return f"jvm destroy res={result}"
+
+
+def normal_calls(args):
+    calls = ["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1", "FindClass java/lang/String", f"FindClass {MAIN}",
+             f"GetStaticMethodID {MAIN} main ([Ljava/lang/String;)V", f"NewObjectArray {len(args)} java/lang/String null"]
+    for i, arg in enumerate(args):
+        calls += [f"NewStringUTF {hexed(arg)}", f"SetObjectArrayElement {i} {hexed(arg)}"]
+    return calls + [f"CallStaticVoidMethodV {MAIN} main", "DestroyJavaVM"]
+
+
+@dataclass
+class Row:
+    name: str
+    args: list = field(default_factory=list)
+    app: dict = field(default_factory=dict)     # platform.app(**app)
+    run: dict = field(default_factory=dict)     # platform.run(..., **run)
+    code: int = 0
+    boxes: list = None                          # texts, in order; caption and error icon checked too
+    splash: bool = None                         # seen or not; when seen, up at every box
+    options: list = None                        # "fixed" and "folders" stand for the platform's lists
+    main_args: list = None                      # what main got, decoded (it gets them hex-encoded)
+    calls: list = None                          # JNI calls after the options (Windows double)
+    vm_loaded: bool = None                      # anything in the VM record at all
+    log: list = None                            # (message, code) lines after the start line; "end"; [] no file
+    received: str = None                        # bytes on 6152 (one connection, closed by the sender)
+    stdout: str = None
+    only: str = None
+
+
+ROWS = [
+    # Exit paths: the code, every box, how far the VM got.
+    Row("no-arguments-splash", boxes=[destroyed(0)], splash=True, options=["fixed", "folders"], main_args=[],
+        calls=normal_calls([]), log=START + END),
+    Row("destroy-result", ["-noSplash"], app=dict(vm=dict(destroy=7)), code=7, boxes=[destroyed(7)], only="wine"),
+    Row("destroy-negative-no-strings", ["-noSplash"], app=dict(strings=False, vm=dict(destroy=-5)), code=-5,
+        boxes=[destroyed(-5)], only="wine"),
+    Row("runtime-missing", ["-noSplash"], app=dict(runtime="none"), code=-1, boxes=[VM_NOT_LOADED],
+        log=START + END),
+    Row("runtime-missing-no-strings", ["-noSplash"], app=dict(runtime="none", strings=False), code=-1, boxes=[],
+        only="wine"),
+    Row("vm-not-created", ["-noSplash"], app=dict(vm=dict(create=-6)), code=-6, boxes=[VM_NOT_CREATED],
+        options=["fixed", NO_SPLASH, "folders"], calls=["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1"], only="wine"),
+    Row("vm-not-created-no-strings", ["-noSplash"], app=dict(strings=False, vm=dict(create=-6)), code=-3, boxes=[],
+        only="wine"),
+    Row("no-entry-point", ["-noSplash"], app=dict(runtime="noentry"), code=-1, boxes=[VM_NOT_CREATED]),
+    Row("main-class-missing", ["file.q7"], app=dict(vm=dict(missing_class=MAIN, destroy=3)), code=3, splash=True,
+        boxes=[MAIN_NOT_CALLED, destroyed(3)],
+        calls=["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1", "FindClass java/lang/String",
+               f"FindClass {MAIN} -> null", "DestroyJavaVM"], only="wine"),
+    Row("string-class-missing", ["-noSplash"], app=dict(vm=dict(missing_class="java/lang/String")),
+        boxes=[MAIN_NOT_CALLED, destroyed(0)],
+        calls=["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1", "FindClass java/lang/String -> null",
+               f"FindClass {MAIN}", "DestroyJavaVM"], only="wine"),
+    Row("main-method-missing", ["-noSplash"], app=dict(vm=dict(missing_method=1, destroy=-9)), code=-9,
+        boxes=[MAIN_NOT_CALLED, destroyed(-9)], calls=normal_calls([])[:3] + [
+            f"GetStaticMethodID {MAIN} main ([Ljava/lang/String;)V -> null", "DestroyJavaVM"], only="wine"),
+    # The real VM's own answers: an empty class path, a main class without main.
+    Row("main-class-missing-real-vm", ["file.q7"], app=dict(vm=dict(missing_class=MAIN)), splash=True,
+        boxes=[MAIN_NOT_CALLED, destroyed(0)], vm_loaded=False, only="linux"),
+    Row("main-method-missing-real-vm", ["-noSplash"], app=dict(vm=dict(missing_method=1)),
+        boxes=[MAIN_NOT_CALLED, destroyed(0)], only="linux"),
+    Row("exception-out-of-main", ["-noSplash"], app=dict(vm=dict(throw=1)), boxes=[destroyed(0)], log=START + END,
+        only="linux"),
+    Row("system-exit-in-main", ["-noSplash"], app=dict(vm=dict(exit=42)), code=42, boxes=[], log=START),
+    Row("runtime-needs-its-bin-folder", ["-noSplash"], app=dict(runtime="dep"), boxes=[destroyed(0)], only="wine"),
+
+    # The option list and the splash switch.
+    Row("no-splash-twice", ["-noSplash", "file.qz57", "-noSplash"], options=["fixed", NO_SPLASH, NO_SPLASH, "folders"]),
+    Row("no-splash-any-case", ["-NOSPLASH", "x", "-nOsPlAsH"], app=dict(vm=dict(main_ms=1500)), splash=False,
+        options=["fixed", NO_SPLASH, NO_SPLASH, "folders"]),
+    Row("no-splash-near-misses", ["-noSplashX", "noSplash", "--noSplash", "-noSplash ", "-noSplash"], splash=True,
+        options=["fixed", NO_SPLASH, "folders"], boxes=[destroyed(0)]),
+    Row("argv0-without-directory", ["x"], run=dict(argv0="-noSplash", cwd="app"),
+        options=["fixed", NO_SPLASH, "folders"], main_args=["x"], only="wine"),
+    Row("application-folder-outside-ansi", ["-noSplash"], app=dict(suffix="-\u00fc\u0416\u6587"),
+        options=["fixed-ansi", NO_SPLASH, "folders"], only="wine"),
+    Row("user-folder-missing", ["-noSplash"], run=dict(folders={"AppData": None, "Common AppData": "C:\\qz-all"}),
+        options=["fixed", NO_SPLASH, "-Duser.temp.path="], only="wine"),
+    Row("all-users-folder-missing", ["x"],
+        run=dict(folders={"AppData": "C:\\qz-\u0416\u00e9\u4e2d\u0100rest", "Common AppData": None}),
+        options=["fixed", "-Duser.appdata.path=C:\\qz-\x16\xe9-"], only="wine"),
+    Row("both-folders-narrowed", ["x"],
+        run=dict(folders={"AppData": "C:\\qz-\u0416\u00e9\u4e2d\u0100rest", "Common AppData": "C:\\qz-all"}),
+        options=["fixed", "-Duser.appdata.path=C:\\qz-\x16\xe9-", "-Duser.temp.path=C:\\qz-\x16\xe9-"], only="wine"),
+
+    # What main receives.
+    Row("arguments-encoded", ["-noSplash", "C:\\M\u00fcll", "a b", "\U0001F600", "ABC Xyz", OUTSIDE_ANSI, "", LONG, "", "x"],
+        main_args=["-noSplash", "C:\\M\u00fcll", "a b", "\U0001F600", "ABC Xyz", OUTSIDE_ANSI, OUTSIDE_ANSI, LONG, LONG, "x"],
+        calls=normal_calls(["-noSplash", "C:\\M\u00fcll", "a b", "\U0001F600", "ABC Xyz", OUTSIDE_ANSI, OUTSIDE_ANSI,
+                            LONG, LONG, "x"])),
+
+    # Linux: the settings folders of the option list, arguments as bytes (ill-formed UTF-8 becomes
+    # U+FFFD per maximal subpart), a 30,000-byte argument, a start through PATH, no display at all.
+    Row("xdg-user-folder-missing", ["-noSplash"], run=dict(folders={"XDG_CONFIG_HOME": None}),
+        options=["fixed", NO_SPLASH, "-Duser.temp.path="], only="linux"),
+    Row("xdg-system-folder-missing", ["-noSplash"], run=dict(folders={"XDG_CONFIG_DIRS": None}),
+        options=["fixed", NO_SPLASH, "appdata"], only="linux"),
+    Row("arguments-as-bytes", ["-noSplash", b"\xc0\xaf", b"\xed\xa0\x80", b"\xf4\x90\x80\x80", b"a\xe2\x82", b"\xf0\x9f\x98\x80",
+                              "\u00e9" * 15000],
+        main_args=["-noSplash", "\ufffd" * 2, "\ufffd" * 3, "\ufffd" * 4, "a\ufffd", "\U0001F600", "\u00e9" * 15000], only="linux"),
+    Row("started-through-path", ["x"], run=dict(argv0="bare"), options=["fixed", "folders"], main_args=["x"],
+        only="linux"),
+    Row("headless", ["file.qz57"], app=dict(runtime="none"), run=dict(display=False), code=-1, splash=False,
+        boxes=[VM_NOT_LOADED], only="linux"),
+
+    # The log.
+    Row("log-folder-missing", ["-noSplash"], run=dict(log="nofolder"), log=[], main_args=["-noSplash"]),
+    Row("documents-folder-unknown", ["-noSplash"], run=dict(folders={"Personal": None}, log="nofolder"), log=[], main_args=["-noSplash"],
+        stdout="WriteFile failed with error 6.\r\n" * 16, only="wine"),
+
+    # Self-protection.
+    Row("image-altered", ["-noSplash"], app=dict(altered=True), code=6101, boxes=[LOAD_ERROR], vm_loaded=False,
+        log=START + [(LOAD_ERROR, 1012)]),
+    Row("under-debugger", ["-noSplash"], run=dict(debug=True), code=6201, boxes=[LOAD_ERROR], vm_loaded=False,
+        log=START + [("CL interpretation", -767)]),
+
+    # A second instance (another holds the lock): hand-off on 6152, nothing else.
+    Row("hand-off-no-arguments", run=dict(lock=True, listener=True), boxes=[], vm_loaded=False, log=START,
+        received="002d006e"),
+    Row("hand-off-arguments", ["-noSplash", "-x", "C:\\a.dat", "x", "", "", "\U0001F600\u00e9\u00ab", LONG],
+        run=dict(lock=True, listener=True), boxes=[], vm_loaded=False,
+        received="".join(map(hexed, ["-noSplash", "-x", "C:\\a.dat", "x", "x", "x", "\U0001F600\u00e9\u00ab", LONG]))),
+    Row("hand-off-empty-first", ["", "x"], run=dict(lock=True, listener=True), received="0078"),
+    Row("hand-off-dropped-early", ["-x", "\u4e2d" * 3000, "y" * 3000], run=dict(lock=True, listener=8), boxes=[],
+        received="002d0078"),
+    Row("activation", run=dict(lock=True, listener=True, windows=[
+        ("i", FRAME, LOCK_UNITS), ("z", FRAME, "\u5858" + LOCK_UNITS),                # raised
+        ("h", FRAME, LOCK_UNITS + "1A"), ("i", FRAME, "\u7a71" + LOCK_UNITS[1:]),      # hidden; "qz-Lumi..."
+        ("i", FRAME, "QZ-Lumiscope_QZ-57"), ("i", FRAME, "A" + LOCK_UNITS),            # one byte per unit
+        ("i", FRAME, ""), ("i", FRAME + "X", LOCK_UNITS + "2A"), ("i", FRAME[:-1], LOCK_UNITS + "3A")]),
+        only="wine"),
+]
+
+
+def expand(platform, app, options):
+    out = []
+    for option in options:
+        if option == "fixed":
+            out += platform.fixed_options(app.native)
+        elif option == "fixed-ansi":  # the folder in the ANSI code page: U+00FC is 0xFC, the others "?"
+            out += platform.fixed_options(app.native.replace("\u0416\u6587", "??"))
+        else:
+            out += {"folders": platform.folder_options(), "appdata": platform.folder_options()[:1]}.get(option, [option])
+    return out
+
+
+def check_log(data, lines):
+    if not lines:
+        assert data is None
+        return
+    text = data.decode("utf-16-le")
+    date = re.match(r"QZ_CW_startLOG : Started logging\.\.\.(\w{3} \w{3} \d\d \d\d:\d\d:\d\d \d{4})\n\r\n", text)
+    assert date, text[:80]
+    assert abs(time.mktime(time.strptime(date.group(1))) - time.time()) < 600
+    rest = "".join("Ended logging... : \r\n" if line == "end" else f"QZ-Lumiscope_QZ-57.exe : {line[0]} : {line[1]}\r\n"
+                   for line in lines)
+    assert text[date.end():] == rest
+
+
+def test_row(platform, row):
+    app = platform.app(**row.app)
+    listener = row.run.get("listener")
+    inputs = {**row.run, "listener": listener and Listener(None if listener is True else listener)}
+    out = platform.run(app, row.args, splash=bool(row.splash), **inputs)
+    assert (out.killed, out.code) == (False, row.code)
+    if row.boxes is not None:
+        caption = CAPTION if row.app.get("strings", True) else "Error"
+        assert [(b.caption, b.text, b.icon) for b in out.boxes] == [(caption, platform.text(t), True) for t in row.boxes]
+    if row.splash is not None:
+        assert (out.splash is not None) == row.splash
+    if row.splash:  # up at every box, centred, fading in by steps of 4 from 64, a layered tool window
+        alphas, (w, h) = out.splash["alphas"], platform.picture
+        assert all(b.splash for b in out.boxes) and alphas == sorted(set(alphas)) and alphas[0] >= 64 and not any(a % 4 for a in alphas)
+        assert out.splash["rect"] == [(out.screen[0] - w) // 2, (out.screen[1] - h) // 2, w, h]
+        assert out.splash.get("exstyle", 0x80080) == 0x80080  # Windows: a layered tool window
+    if row.options is not None:
+        assert out.record.options == expand(platform, app, row.options)
+    if row.main_args is not None:
+        assert out.record.args == [hexed(a) for a in row.main_args] and "end" in out.record.lines
+    if row.calls is not None and platform.name.startswith("wine"):
+        assert out.record.calls == row.calls
+    if row.vm_loaded is not None:
+        assert bool(out.record and out.record.lines) == row.vm_loaded
+    if row.log is not None:
+        check_log(out.log, row.log)
+        assert out.log_folder == bool(row.log), "the log never makes its folder"
+    if row.received is not None:
+        assert out.received == row.received.encode() and out.listener.connections == 1
+        assert out.listener.closed_by_sender or out.listener.drop_after
+    if row.stdout is not None:
+        assert out.stdout == row.stdout
+    if out.windows:  # activation: the first two qualify, the rest are near misses and stay as they were
+        raised, missed = out.windows[:2], out.windows[2:]
+        assert not raised[0]["iconic"] and raised[1]["zoomed"], "restored only when minimised"
+        assert max(raised, key=lambda w: w["pos"])["front"], "the later one ends in front"
+        assert all(w["iconic"] for w in missed) and not missed[0]["visible"]
+
+
+def test_first_instance_holds_the_lock(platform):
+    """A running first instance: a second start without a listener tries five times (five pauses of
+    5 s), exits 0 and leaves the first's log alone (it cannot even open it); the first's splash goes by
+    itself after its display time, fully faded in, while main still runs; once the first has ended,
+    the next start is a first instance again."""
+    first = platform.start(platform.app(vm=dict(until="stop")), [], splash=True)
+    try:
+        assert first.wait_main()
+        log = platform.read_log()
+        port_free().close()  # nobody listens
+        second_app = platform.app()
+        second = platform.run(second_app, ["C:\\a.dat"], log="keep")
+        assert platform.read_log() == log
+    finally:
+        out = first.stop()
+    assert (second.code, second.boxes, second.record) == (0, [], None)
+    assert second.elapsed >= 24000
+    assert second.stdout == platform.write_failed * 8
+    assert (out.code, [b.text for b in out.boxes]) == (0, [destroyed(0)])
+    assert out.splash["alphas"][-1] == 252
+    assert out.splash["t"] + 10000 <= out.splash["gone"] <= out.boxes[0].t and not out.boxes[0].splash
+    check_log(out.log, START + END)
+    assert platform.run(second_app, ["-noSplash"]).record.args == [hexed("-noSplash")]
+
+
+def linux_only(platform):
+    if not platform.name.startswith("linux"):
+        pytest.skip("needs the Java test application (the Windows double neither listens nor starts programs)")
+
+
+def test_twenty_starts_meet_on_one_lock(platform):
+    """Twenty simultaneous starts: exactly one runs Java; the other nineteen hand their argument to the
+    running Java application on 6152 and exit 0."""
+    linux_only(platform)
+    apps = [platform.app(vm=dict(listen=1, until="stop")) for _ in range(20)]
+    runs = [platform.start(app, [f"n{i}"], display=False, log="keep") for i, app in enumerate(apps)]
+    deadline = time.monotonic() + 90
+    while time.monotonic() < deadline and sum(r.process.poll() is None for r in runs) > 1:
+        time.sleep(0.2)
+    firsts = [i for i, app in enumerate(apps) if app.record()]
+    assert len(firsts) == 1, firsts
+    first = firsts[0]
+    seconds = [runs[i].finish() for i in range(20) if i != first]
+    assert all((s.code, s.boxes) == (0, []) for s in seconds)
+    received = [line for line in apps[first].record().lines if line.startswith("received ")]
+    assert sorted(received) == sorted(f"received {hexed(f'n{i}')}" for i in range(20) if i != first)
+    out = runs[first].stop()
+    assert (out.code, out.record.args) == (0, [hexed(f"n{first}")])
+
+
+def test_lock_not_inherited_by_programs_java_starts(platform):
+    """A program the Java application starts outlives it; the next start is a first instance all the
+    same (the lock goes with the launcher's process, kill -9 included)."""
+    linux_only(platform)
+    out = platform.run(platform.app(vm=dict(child=1)), ["-noSplash"], display=False)
+    assert out.code == 0 and "end" in out.record.lines
+    again = platform.start(platform.app(vm=dict(until="stop")), ["-noSplash"], display=False)
+    assert again.wait_main()
+    again.process.kill()
+    again.finish()
+    assert platform.run(platform.app(), ["-noSplash"], display=False).record.args == [hexed("-noSplash")]

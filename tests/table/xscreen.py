@@ -1,0 +1,126 @@
+"""What a user sees of the Linux launcher on an X display: a private Xvfb with a window manager
+(openbox) and a compositor, and a watcher that records, during one run, the splash window (its
+rectangle, the opacities it shows, when it came and went) and every dialog (its caption, whether it
+had the keyboard focus and the splash was still up), dismissing each dialog with a real key press."""
+import os
+import select
+import subprocess
+import threading
+import time
+
+from Xlib import X, Xatom, display as xdisplay, error as xerror
+from Xlib.ext import xtest
+
+
+class Display:
+    def __init__(self):
+        read, write = os.pipe()
+        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
+                                       pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
+        os.close(write)
+        self.name = ":" + os.read(read, 16).decode().strip()
+        os.close(read)
+        for _ in range(100):  # the number comes a moment before the server takes connections
+            try:
+                self.x = xdisplay.Display(self.name)
+                break
+            except xerror.DisplayConnectionError:
+                time.sleep(0.05)
+        env = {**os.environ, "DISPLAY": self.name}
+        for wm in (["openbox"], ["xcompmgr"]):
+            self.procs.append(subprocess.Popen(wm, env=env, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL))
+        self.x.set_error_handler(lambda *a: None)
+        for _ in range(100):  # the window manager announces itself on the root window
+            if self.x.screen().root.get_full_property(self.x.intern_atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType):
+                break
+            time.sleep(0.05)
+
+    def close(self):
+        for proc in reversed(self.procs):
+            proc.terminate()
+            proc.wait()
+
+
+class Watcher(threading.Thread):
+    def __init__(self, name, started):
+        super().__init__(daemon=True)
+        self.x, self.started, self.stopping = xdisplay.Display(name), started, False
+        self.x.set_error_handler(lambda *a: None)
+        atom = self.x.intern_atom
+        self.type, self.opacity, self.title = atom("_NET_WM_WINDOW_TYPE"), atom("_NET_WM_WINDOW_OPACITY"), atom("_NET_WM_NAME")
+        self.kinds = {atom("_NET_WM_WINDOW_TYPE_SPLASH"): "splash", atom("_NET_WM_WINDOW_TYPE_DIALOG"): "dialog"}
+        self.root = self.x.screen().root
+        self.root.change_attributes(event_mask=X.SubstructureNotifyMask)
+        self.x.sync()
+        self.splash, self.dialogs, self.pending = None, [], []
+        self.start()
+
+    def now(self):
+        return (time.monotonic() - self.started) * 1000
+
+    def kind(self, window):
+        value = window.get_full_property(self.type, Xatom.ATOM)
+        return self.kinds.get(value.value[0]) if value else None
+
+    def run(self):
+        while not self.stopping:
+            while self.x.pending_events():
+                self.handle(self.x.next_event())
+            for dialog, at in list(self.pending):
+                if time.monotonic() >= at:
+                    self.pending.remove((dialog, at))
+                    self.dismiss(dialog)
+            select.select([self.x.fileno()], [], [], 0.02)
+
+    def handle(self, event):
+        try:
+            if event.type == X.CreateNotify and event.parent == self.root:
+                event.window.change_attributes(event_mask=X.PropertyChangeMask | X.StructureNotifyMask)
+            elif event.type == X.MapNotify and event.window == event.event:
+                kind = self.kind(event.window)
+                if kind == "splash" and self.splash is None:
+                    geometry = event.window.get_geometry()
+                    at = self.root.translate_coords(event.window, 0, 0)
+                    self.splash = {"window": event.window, "t": self.now(), "gone": None, "alphas": [],
+                                   "rect": [at.x, at.y, geometry.width, geometry.height]}
+                    self.read_opacity(event.window)
+                elif kind == "dialog":
+                    title = event.window.get_full_property(self.title, X.AnyPropertyType)
+                    self.dialogs.append({"window": event.window, "t": self.now(), "caption": title.value.decode() if title else None,
+                                         "splash": self.splash is not None and self.splash["gone"] is None, "focus": False})
+                    self.pending.append((self.dialogs[-1], time.monotonic() + 0.3))
+            elif event.type == X.PropertyNotify and event.atom == self.opacity:
+                self.read_opacity(event.window)
+            elif event.type in (X.UnmapNotify, X.DestroyNotify) and self.splash and event.window == self.splash["window"]:
+                self.splash["gone"] = self.splash["gone"] or self.now()
+        except xerror.XError:
+            pass  # a window that went while we looked
+
+    def read_opacity(self, window):
+        if self.splash and window == self.splash["window"]:
+            value = window.get_full_property(self.opacity, Xatom.CARDINAL)
+            if value and (not self.splash["alphas"] or self.splash["alphas"][-1] != value.value[0] >> 24):
+                self.splash["alphas"].append(value.value[0] >> 24)
+
+    def dismiss(self, dialog):
+        """Return, typed on the keyboard: it reaches the dialog only when the dialog took the focus.
+        (One dialog after another may well get the same window id.)"""
+        window = dialog["window"]
+        for _ in range(40):
+            focus = self.x.get_input_focus().focus
+            dialog["focus"] = focus == window or (hasattr(focus, "query_tree") and focus.query_tree().parent == window)
+            if dialog["focus"]:
+                break
+            time.sleep(0.05)
+        keycode = self.x.keysym_to_keycode(0xFF0D)
+        xtest.fake_input(self.x, X.KeyPress, keycode)
+        xtest.fake_input(self.x, X.KeyRelease, keycode)
+        self.x.sync()
+
+    def finish(self):
+        self.stopping = True
+        self.join(5)
+        self.x.close()
+        if self.splash:
+            self.splash.pop("window")
+        return self.splash, [{k: v for k, v in d.items() if k != "window"} for d in self.dialogs]

@@ -1,0 +1,350 @@
+#!/usr/bin/python3
+"""Start-up benchmark of the launcher beside its alternatives, run as alternating pairs.
+
+    python3 tools/bench/bench.py [--pairs 21] [--no-wine] [--out docs]
+Needs a built Linux launcher (build/linux), its runtime (make dist-linux), Debian's OpenJDK 17, Xvfb,
+python3-matplotlib and libx11-dev; under Wine also the x86_64 build. Prints the table and writes
+docs/performance.md and docs/performance.png. Not a test: nothing here passes or fails."""
+import argparse, datetime, string, fcntl, os, platform, queue, shutil, signal, socket, statistics, subprocess, sys, threading, time
+
+HERE = os.path.dirname(os.path.abspath(__file__))
+ROOT = os.path.dirname(os.path.dirname(HERE))
+JDK = '/usr/lib/jvm/java-17-openjdk-amd64'
+MAIN = 'com.qz.kpo.emu57.app.ApplicationMainForm'
+EXE = 'QZ-Lumiscope_QZ-57'
+LOCK = '\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735.lock'
+HANDOFF_ARGS = ['/home/ana/Messungen/Probe \u00e9t\u00e9.l57', 'scan \U0001F600 02.l57']
+WINE = '/usr/lib/wine/wine64'
+
+def reexec():
+    """Runs again under Debian's python3 (matplotlib) in a private network namespace (port 6152)."""
+    if os.environ.get('BENCH_NETNS'):
+        if os.environ['BENCH_NETNS'] == 'private':
+            subprocess.run(['ip', 'link', 'set', 'lo', 'up'], check=True)
+        return
+    py = '/usr/bin/python3' if os.path.exists('/usr/bin/python3') else sys.executable
+    private = shutil.which('unshare') and subprocess.run(['unshare', '-n', 'true'], capture_output=True).returncode == 0
+    os.environ['BENCH_NETNS'] = 'private' if private else 'shared'
+    argv = ['unshare', '-n'] if private else []
+    os.execvp(argv[0] if argv else py, argv + [py, os.path.abspath(__file__)] + sys.argv[1:])
+
+def sh(*argv, **kw):
+    return subprocess.run(argv, check=True, capture_output=True, text=True, **kw).stdout
+
+def build(a):
+    """The baselines, the stand-in application and the application folders, in build/bench."""
+    b = a.work
+    for name in ['map_watch', 'baseline_window', 'baseline_send']:
+        sh('cc', '-O2', '-o', f'{b}/{name}', f'{HERE}/{name}.c', *(['-lX11'] if 'send' not in name else []))
+    sh('cc', '-O2', '-shared', '-fPIC', '-o', f'{b}/vm_load_stamp.so', f'{HERE}/vm_load_stamp.c')
+    os.makedirs(b, exist_ok=True)
+    sh(f'{JDK}/bin/javac', '--release', '17', '-d', f'{b}/classes', f'{HERE}/ApplicationMainForm.java')
+    sh(f'{JDK}/bin/jar', '--create', '--file', f'{b}/bench.jar', '-C', f'{b}/classes', '.')
+    jre = os.path.abspath(a.jre)
+    if not os.path.exists(f'{jre}/lib/server/libjvm.so'):
+        sys.exit(f'bench: no runtime at {jre}: run make dist-linux first')
+    for d in [f'{b}/app', f'{b}/nojre']:  # the second has no runtime: the launcher stops before the VM
+        shutil.rmtree(d, ignore_errors=True)
+        os.makedirs(d)
+        shutil.copy2(a.launcher, f'{d}/{EXE}')
+        shutil.copy2(f'{b}/bench.jar', f'{d}/emu57.jar')
+    os.symlink(jre, f'{b}/app/jre')
+    if a.wine:
+        sh('x86_64-w64-mingw32-gcc', '-O2', '-static', '-mwindows', '-o', f'{b}/baseline_window_win.exe',
+           f'{HERE}/baseline_window_win.c')
+        d = f'{b}/wine-app'
+        os.makedirs(f'{d}/jre/bin/client', exist_ok=True)
+        shutil.copy2(a.exe, f'{d}/{EXE}.exe')
+        for dll in [f'{a.build}/x86_64/tests/wine/vmdouble/jvm.dll', f'{a.build}/x86_64/tests/wine/jvm.dll']:
+            os.path.exists(dll) and shutil.copy2(dll, f'{d}/jre/bin/client/jvm.dll')
+        open(f'{d}/emu57.jar', 'w').close()
+
+def environment(a, **extra):
+    home = f'{a.tmp}/home'
+    return dict({'PATH': '/usr/bin:/bin', 'HOME': home, 'XDG_RUNTIME_DIR': f'{a.tmp}/run',
+                 'XDG_CONFIG_HOME': f'{home}/.config', 'LANG': 'C.UTF-8'}, **extra)
+
+def spawn(argv, env, out=os.devnull):
+    actions = [(os.POSIX_SPAWN_OPEN, 0, os.devnull, os.O_RDONLY, 0),
+               (os.POSIX_SPAWN_OPEN, 1, out, os.O_WRONLY | os.O_CREAT | os.O_TRUNC, 0o600),
+               (os.POSIX_SPAWN_DUP2, 1, 2)]
+    start = time.monotonic_ns()
+    return start, os.posix_spawn(argv[0], argv, env, file_actions=actions)
+
+def finish(pid):
+    """Waits for the process: (end time, exit code, peak resident KB)."""
+    _, status, usage = os.wait4(pid, 0)
+    return time.monotonic_ns(), os.waitstatus_to_exitcode(status), usage.ru_maxrss
+
+class Screen:
+    """A private Xvfb (-displayfd: never races for a number) or a given display, with the map watcher."""
+    def __init__(self, a, display=None, env=None):
+        self.server = None
+        if display is None:
+            r, w = os.pipe()
+            self.server = subprocess.Popen(['Xvfb', '-displayfd', str(w), '-screen', '0', '1280x1024x24',
+                                            '-nolisten', 'tcp'], pass_fds=(w,), stdout=subprocess.DEVNULL,
+                                           stderr=subprocess.DEVNULL)
+            os.close(w)
+            display = ':' + os.fdopen(r).readline().strip()
+        self.display, self.maps = display, queue.Queue()
+        self.watch = subprocess.Popen([f'{a.work}/map_watch'], env=dict(env or os.environ, DISPLAY=display),
+                                      stdout=subprocess.PIPE, text=True)
+        assert self.watch.stdout.readline().strip() == 'ready'
+        threading.Thread(target=self.read, daemon=True).start()
+
+    def read(self):
+        for line in self.watch.stdout:
+            _, ns, w, h = line.split()
+            self.maps.put((int(ns), int(w), int(h)))
+
+    def mapped(self, size, timeout=30):
+        end = time.monotonic() + timeout
+        while True:
+            ns, w, h = self.maps.get(timeout=max(0.01, end - time.monotonic()))
+            if size in (None, (w, h)):
+                return ns
+
+    def close(self):
+        for p in filter(None, [self.watch, self.server]):
+            p.kill(), p.wait()
+
+def map_time(screen, argv, env, size):
+    """Process start to the first window of `size` mapped; the process is then ended."""
+    while not screen.maps.empty():
+        screen.maps.get()
+    start, pid = spawn(argv, env)
+    try:
+        return (screen.mapped(size) - start) / 1e6
+    except queue.Empty:
+        return None
+    finally:
+        os.kill(pid, signal.SIGKILL)
+        finish(pid)
+
+def java_run(argv, env, out, stamps=None):
+    """ms from start to: main entered, process end, [the program's first code, the load of libjvm.so]."""
+    if stamps:
+        env = dict(env, LD_AUDIT=stamps[0], BENCH_STAMP_LOG=stamps[1])
+        open(stamps[1], 'w').close()
+    start, pid = spawn(argv, env, out)
+    end, code, _ = finish(pid)
+    lines = open(out).read().split()
+    entered = next((int(w) for w in lines if w.isdigit()), None)
+    if code != 0 or entered is None:
+        sys.exit(f'bench: {argv[0]} ended with {code}:\n' + open(out).read())
+    marks = [(int(l.split()[0]) - start) / 1e6 for l in open(stamps[1])] if stamps else []
+    return [(entered - start) / 1e6, (end - start) / 1e6] + marks
+
+def handoff_time(listener, argv, env):
+    """Process start to the last byte received on 6152; with the bytes received."""
+    start, pid = spawn(argv, env)
+    listener.settimeout(60)
+    conn, _ = listener.accept()
+    data, last = b'', None
+    while chunk := conn.recv(65536):
+        data, last = data + chunk, time.monotonic_ns()
+    conn.close()
+    finish(pid)
+    return (last - start) / 1e6, data
+
+def measure(a):
+    R = {f[0]: ([], []) for f in FIGS}
+    for d in ['home/.config', 'home/Documents/QZ-LumiscopeQZ-57Nova/logs', 'run']:  # the launcher logs
+        os.makedirs(f'{a.tmp}/{d}', mode=0o700)
+    launcher, out = f'{a.work}/app/{EXE}', f'{a.tmp}/out.txt'
+    headless = environment(a)
+    # Debian's java gets exactly the options the launcher gave its VM (read back from the VM itself).
+    start, pid = spawn([launcher], dict(headless, BENCH_PRINT_OPTIONS='1'), out)
+    finish(pid)
+    options = [l[7:] for l in open(out).read().splitlines() if l.startswith('option ')]
+    # The VM does not report the class path; the launcher's is the application folder's emu57.jar.
+    java = [f'{a.jre}/bin/java', '-cp', f'{a.work}/app/emu57.jar'] + options + [MAIN]
+    a.java = java
+    screen = Screen(a)
+    xenv = environment(a, DISPLAY=screen.display)
+    size = tuple(int(v) for v in a.splash_size)
+    listener = socket.create_server(('127.0.0.1', 6152), reuse_port=False)
+    encoded = [arg.encode('utf-16-be').hex() for arg in HANDOFF_ARGS]
+    wine = None
+    try:
+        wine = Wine(a) if a.wine else None
+        pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out)
+    finally:
+        screen.close()
+        wine and wine.close()
+    return R
+
+def pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out):
+    launcher, nojre = f'{a.work}/app/{EXE}', f'{a.work}/nojre/{EXE}'
+    for i in range(a.pairs):
+        order = (0, 1) if i % 2 == 0 else (1, 0)  # who goes first alternates too
+        for who in order:
+            for name, run in [
+                ('splash', lambda: map_time(screen, [launcher] if who == 0 else
+                                            [f'{a.work}/baseline_window', *a.splash_size], xenv, size)),
+                ('wine', lambda: wine and wine.map_time(who)),
+                ('main', lambda: java_run([launcher] if who == 0 else java, headless, out)),
+                ('prevm', lambda: java_run([launcher] if who == 0 else java, headless, out,
+                                                (f'{a.work}/vm_load_stamp.so', f'{a.tmp}/stamps.txt'))),
+                ('handoff', lambda: handoff(a, listener, launcher, encoded, who, headless)),
+                ('rss', lambda: rss(a, nojre, headless) if who == 0 else None)]:
+                v = run()
+                if name == 'main':
+                    R['main'][who].append(v[0])
+                    R['end'][who].append(v[1])
+                elif name == 'prevm':
+                    R['link'][who].append(v[2])
+                    R['prevm'][who].append(v[3] - v[2])
+                    a.vm_part[who].append(v[0] - v[3])
+                elif v is not None:
+                    R[name][who].append(v)
+        print(f'bench: pair {i + 1}/{a.pairs} done', file=sys.stderr, flush=True)
+
+def handoff(a, listener, launcher, encoded, who, env):
+    with open(f'{a.tmp}/run/{LOCK}', 'a') as lock:  # a first instance, as far as the launcher can tell
+        fcntl.flock(lock, fcntl.LOCK_EX)
+        ms, data = handoff_time(listener, [launcher, *HANDOFF_ARGS] if who == 0 else
+                                [f'{a.work}/baseline_send', *encoded], env)
+    if data != ''.join(encoded).encode():
+        sys.exit(f'bench: hand-off bytes differ: {data!r}')
+    return ms
+
+def rss(a, nojre, env):
+    # Through GNU time: a child of posix_spawn inherits this Python's peak in its ru_maxrss.
+    start, pid = spawn(['/usr/bin/time', '-f', '%M', '-o', f'{a.tmp}/rss.txt', nojre], env)
+    _, code, _ = finish(pid)
+    return int(open(f'{a.tmp}/rss.txt').read().split()[-1]) / 1024 if code == 255 else sys.exit(f'bench: run without runtime ended with {code}')
+
+class Wine:
+    """The x86_64 build under wine64 on the test bed's own Xvfb and prefix (tests/wine/bed.sh)."""
+    def __init__(self, a):
+        print('bench: setting up the Wine prefix', file=sys.stderr, flush=True)
+        self.bed = f'{a.work}/wine-bed'
+        sh('bash', f'{ROOT}/tests/wine/bed.sh', 'setup', self.bed)
+        self.env = dict(l.split('=', 1) for l in sh('bash', '-c', f'. {self.bed}/env.sh; env -0').split('\0') if '=' in l)
+        self.screen = Screen(a, self.env['DISPLAY'], self.env)
+        exe, base = f'{a.work}/wine-app/{EXE}.exe', f'{a.work}/baseline_window_win.exe'
+        self.argv = [[WINE, exe], [WINE, base, *a.splash_size]]
+
+    def map_time(self, who):
+        return map_time(self.screen, self.argv[who], self.env, None)
+
+    def close(self):
+        self.screen.close()
+        sh('bash', f'{ROOT}/tests/wine/bed.sh', 'teardown', self.bed)
+
+SAME = "Debian's java, same runtime and options"
+FIGS = [  # key, what, unit, alternative, goal kind, goal
+    ('splash', 'start to splash window mapped, Linux on Xvfb', 'ms', 'baseline_window (bare Xlib window)', 'ratio', 1.10),
+    ('wine', 'start to splash window mapped, x86_64 under Wine', 'ms', 'baseline_window_win.exe', 'ratio', 1.10),
+    ('main', 'start to Java main entered', 'ms', SAME, 'ratio', 1.00),
+    ('end', 'start to process end', 'ms', SAME, 'ratio', 1.00),
+    ('link', 'exec and dynamic linking: start to the program\'s first code', 'ms', SAME, None, 0),
+    ('prevm', 'own work before the VM library: first code to the load of libjvm.so', 'ms', SAME, 'max', 2.0),
+    ('handoff', 'second instance: start to last byte received on 6152', 'ms', 'baseline_send (bare sender)', 'ratio', 1.20),
+    ('rss', 'peak resident memory, run stopped before the VM', 'MiB', None, 'max', 4.0),
+]
+
+def stats(v):
+    return statistics.median(v), min(v), max(v)
+
+def table(R):
+    rows, missed = ['| figure | series | median | min | max | goal | met |', '|---|---|---:|---:|---:|---|---|'], []
+    for key, what, unit, alt, kind, goal in FIGS:
+        mine, other = R[key]
+        if not mine:
+            continue
+        series = [('launcher', mine, unit)] + ([(alt, other, unit)] if other else [])
+        if other:
+            series.append(('ratio launcher / alternative', [x / y for x, y in zip(mine, other)], 'x'))
+        for n, (name, v, u) in enumerate(series):
+            m = stats(v)
+            judged = (kind == 'ratio' and u == 'x') or (kind == 'max' and n == 0)
+            ok = m[0] <= goal if kind == 'ratio' else m[0] < goal
+            if judged and not ok:
+                missed.append(key)
+            g = (f'<= {goal:.2f}x' if kind == 'ratio' else f'< {goal:g} {unit}') if judged else ''
+            rows.append(f'| {what if n == 0 else ""} | {name} | ' + ' | '.join(f'{x:.2f} {u}' for x in m) +
+                        f' | {g} | {("met" if ok else "NOT met") if judged else ""} |')
+    return '\n'.join(rows), missed
+
+def sizes(a):
+    picture = os.path.getsize(a.bmp)
+    rows = ['| executable | total | splash picture | without picture |', '|---|---:|---:|---:|']
+    for name, path, pad in [('Linux x86_64 ELF', a.launcher, 1), ('Windows x86_64', f'{a.build}/x86_64/launcher/{EXE}.exe', 8),
+                            ('Windows i686', f'{a.build}/i686/launcher/{EXE}.exe', 8)]:
+        if os.path.exists(path):
+            total, pic = os.path.getsize(path), (picture + pad - 1) // pad * pad
+            rows.append(f'| {name} | {total:,} B ({total / 1024:.1f} KiB) | {pic:,} B | {total - pic:,} B ({(total - pic) / 1024:.1f} KiB) |')
+    return '\n'.join(rows)
+
+def plot(R, path):
+    import matplotlib
+    matplotlib.use('Agg')
+    import matplotlib.pyplot as plt
+    figs = [f for f in FIGS if R[f[0]][0]]
+    cols = (len(figs) + 1) // 2
+    fig, axes = plt.subplots(2, cols, figsize=(3.2 * cols, 9), squeeze=False)
+    [ax.set_visible(False) for ax in axes.flat[len(figs):]]
+    for ax, (key, what, unit, alt, kind, goal) in zip(axes.flat, figs):
+        data = [v for v in R[key] if v]
+        ax.boxplot(data, labels=['launcher', 'alternative'][:len(data)], widths=0.5, showfliers=False)
+        for n, v in enumerate(data):
+            ax.plot([n + 1 + 0.12 * ((i % 5) - 2) / 2 for i in range(len(v))], v, '.', alpha=0.6,
+                    color=['tab:blue', 'tab:orange'][n])
+        if kind == 'max':
+            ax.axhline(goal, color='tab:red', linestyle='--', label=f'goal < {goal:g} {unit}')
+            ax.legend(fontsize=7)
+        ax.set_title('\n'.join(__import__('textwrap').wrap(what, 28)), fontsize=8)
+        ax.set_ylabel(unit)
+        ax.set_ylim(bottom=0)
+        ax.tick_params(labelsize=7)
+    fig.tight_layout()
+    fig.savefig(path, dpi=110)
+
+def machine():
+    cpu = next((l.split(':', 1)[1].strip() for l in sh('lscpu').splitlines() if l.startswith('Model name')), '?')
+    debian = open('/etc/debian_version').read().strip() if os.path.exists('/etc/debian_version') else '?'
+    return f'{cpu}, {os.cpu_count()} CPUs; Linux {platform.release()}; Debian {debian}'
+
+def document(a, R, text, missed, size_text):
+    med = lambda v: f'{statistics.median(v):.1f}' if v else '?'
+    notes = ''.join(f'- Not met in this run: {what}.\n' for key, what, *_ in FIGS if key in missed)
+    return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(
+        command=a.command, date=datetime.date.today(), pairs=a.pairs, machine=machine(), table=text,
+        netns='a private network namespace' if os.environ.get('BENCH_NETNS') == 'private' else 'the shared network',
+        picture=f'{os.path.getsize(a.bmp):,}', sizes=size_text, java=' '.join(a.java), vm_launcher=med(a.vm_part[0]),
+        vm_java=med(a.vm_part[1]), prevm_launcher=med(R['prevm'][0]), link_launcher=med(R['link'][0]),
+        missed=('\n## Goals not met\n' + notes) if notes else '')
+
+def main():
+    p = argparse.ArgumentParser(description=__doc__.splitlines()[0])
+    p.add_argument('--pairs', type=int, default=21)
+    p.add_argument('--build', default=f'{ROOT}/build')
+    p.add_argument('--jre', default=f'{ROOT}/dist/linux-x86_64/jre')
+    p.add_argument('--out', default=f'{ROOT}/docs')
+    p.add_argument('--no-wine', dest='wine', action='store_false')
+    a = p.parse_args()
+    reexec()
+    a.command = 'python3 tools/bench/bench.py' + ''.join(f' {x}' for x in sys.argv[1:])
+    a.work, a.launcher, a.bmp = f'{a.build}/bench', f'{a.build}/linux/launcher/{EXE}', f'{a.build}/linux/launcher/splash.bmp'
+    a.exe, a.vm_part = f'{a.build}/x86_64/launcher/{EXE}.exe', ([], [])
+    a.wine = a.wine and os.path.exists(WINE) and os.path.exists(a.exe)
+    head = open(a.bmp, 'rb').read(26)
+    a.splash_size = [str(int.from_bytes(head[18:22], 'little')), str(abs(int.from_bytes(head[22:26], 'little', signed=True)))]
+    build(a)
+    a.tmp = sh('mktemp', '-d').strip()
+    try:
+        R = measure(a)
+    finally:
+        shutil.rmtree(a.tmp, ignore_errors=True)
+    (text, missed), size_text = table(R), sizes(a)
+    print(text + '\n\n' + size_text)
+    os.makedirs(a.out, exist_ok=True)
+    plot(R, f'{a.out}/performance.png')
+    open(f'{a.out}/performance.md', 'w').write(document(a, R, text, missed, size_text))
+    print(f'\nwrote {a.out}/performance.md and {a.out}/performance.png')
+
+if __name__ == '__main__':
+    main()

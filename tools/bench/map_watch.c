@@ -1,0 +1,35 @@
+// Prints "map <CLOCK_MONOTONIC ns> <width> <height>" for every top-level window mapped on the
+// display, after "ready" once it listens. The benchmark's stopwatch for windows appearing.
+#include <X11/Xlib.h>
+#include <stdio.h>
+#include <time.h>
+
+int main(void) {
+    Display* display = XOpenDisplay(NULL);
+    if (display == NULL) return 1;
+    XSelectInput(display, DefaultRootWindow(display), SubstructureNotifyMask);
+    XSync(display, False);
+    printf("ready\n");
+    fflush(stdout);
+    Window ids[4096];
+    int sizes[4096][2], count = 0;
+    for (;;) {
+        XEvent event;
+        XNextEvent(display, &event);
+        struct timespec now;
+        clock_gettime(CLOCK_MONOTONIC, &now);
+        if (event.type == CreateNotify) {
+            int at = count++ % 4096;
+            ids[at] = event.xcreatewindow.window;
+            sizes[at][0] = event.xcreatewindow.width;
+            sizes[at][1] = event.xcreatewindow.height;
+        } else if (event.type == MapNotify) {
+            int width = 0, height = 0;
+            for (int i = 0; i < count && i < 4096; ++i) {
+                if (ids[i] == event.xmap.window) width = sizes[i][0], height = sizes[i][1];
+            }
+            printf("map %lld %d %d\n", (long long)now.tv_sec * 1000000000LL + now.tv_nsec, width, height);
+            fflush(stdout);
+        }
+    }
+}
