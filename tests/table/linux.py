@@ -148,13 +148,15 @@ class Platform:
         out, err = tempfile.TemporaryFile(), tempfile.TemporaryFile()
         started = time.monotonic()
         watcher = Watcher(self.display.name, started) if display else None
+        made = self.display.make_windows(windows) if windows else []
         process = subprocess.Popen([program, *command], stdout=out, stderr=err, stdin=subprocess.DEVNULL,
                                    cwd=app.path if cwd == "app" else "/", env=environment)
-        return Running(self, app, process, out, err, listener, held, started, timeout, watcher)
+        return Running(self, app, process, out, err, listener, held, started, timeout, watcher, made)
 
 
 class Running:
-    def __init__(self, linux, app, process, out, err, listener, held, started, timeout, watcher):
+    def __init__(self, linux, app, process, out, err, listener, held, started, timeout, watcher, made=()):
+        self.made = made
         self.linux, self.app, self.process, self.out, self.err, self.watcher = linux, app, process, out, err, watcher
         self.listener, self.held, self.started, self.timeout = listener, held, started, timeout
 
@@ -180,6 +182,9 @@ class Running:
             killed = True
         elapsed = (time.monotonic() - self.started) * 1000
         splash, dialogs = self.watcher.finish() if self.watcher else (None, [])
+        windows = self.linux.display.window_states(self.made) if self.made else []
+        for window in self.made:
+            window.destroy()
         if self.held:
             self.held.close()
         if self.listener:
@@ -207,6 +212,6 @@ class Running:
                 box.splash, box.t = dialog["splash"], dialog["t"]
         return SimpleNamespace(
             code=code, killed=killed, elapsed=elapsed, stdout=stdout, stderr=stderr,
-            boxes=boxes, splash=splash, screen=self.linux.screen, windows=[], record=self.app.record(), log=self.linux.read_log(),
+            boxes=boxes, splash=splash, screen=self.linux.screen, windows=windows, record=self.app.record(), log=self.linux.read_log(),
             log_folder=(self.linux.docs / LOG).parent.exists(),
             received=self.listener.received if self.listener else None, listener=self.listener)

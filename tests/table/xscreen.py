@@ -10,6 +10,7 @@ import time
 
 from Xlib import X, Xatom, display as xdisplay, error as xerror
 from Xlib.ext import xtest
+from Xlib.protocol import event as xevent
 
 
 class Display:
@@ -20,12 +21,14 @@ class Display:
         os.close(write)
         self.name = ":" + os.read(read, 16).decode().strip()
         os.close(read)
-        for _ in range(100):  # the number comes a moment before the server takes connections
+        for attempt in range(300):  # the number can come a while before the server takes connections
             try:
                 self.x = xdisplay.Display(self.name)
                 break
             except xerror.DisplayConnectionError:
-                time.sleep(0.05)
+                if attempt == 299 or self.procs[0].poll() is not None:
+                    raise
+                time.sleep(0.1)
         env = {**os.environ, "DISPLAY": self.name}
         for wm in (["openbox"], ["xcompmgr"]):
             self.procs.append(subprocess.Popen(wm, env=env, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL))
@@ -34,6 +37,50 @@ class Display:
             if self.x.screen().root.get_full_property(self.x.intern_atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType):
                 break
             time.sleep(0.05)
+
+    def ask_wm(self, window, message, *data):
+        """A client message to the window manager about `window`, as pagers and taskbars send them."""
+        atom = self.x.intern_atom
+        root = self.x.screen().root
+        event = xevent.ClientMessage(window=window, client_type=atom(message), data=(32, (list(data) + [0] * 5)[:5]))
+        root.send_event(event, event_mask=X.SubstructureRedirectMask | X.SubstructureNotifyMask)
+        self.x.sync()
+
+    def make_windows(self, specs):
+        """Top-level windows (state, WM_CLASS, _NET_WM_NAME): state "i" minimised, "z" maximised,
+        "h" never shown, anything else normal. Returns them once the window manager has them."""
+        atom, root, windows = self.x.intern_atom, self.x.screen().root, []
+        for state, cls, title in specs:
+            window = root.create_window(50, 50, 300, 200, 0, X.CopyFromParent)
+            window.set_wm_class(cls, cls)
+            if title:
+                window.change_property(atom("_NET_WM_NAME"), atom("UTF8_STRING"), 8, title.encode("utf-8", "surrogatepass"))
+            if state != "h":
+                window.map()
+            windows.append(window)
+        self.x.sync()
+        time.sleep(0.5)
+        for window, (state, _, _) in zip(windows, specs):
+            if state == "z":
+                self.ask_wm(window, "_NET_WM_STATE", 1, atom("_NET_WM_STATE_MAXIMIZED_VERT"), atom("_NET_WM_STATE_MAXIMIZED_HORZ"))
+            elif state == "i":
+                self.ask_wm(window, "WM_CHANGE_STATE", 3)
+        time.sleep(0.5)
+        return windows
+
+    def window_states(self, windows):
+        """As a user would tell: minimised, shown at all, maximised, in front, in creation order."""
+        atom, root = self.x.intern_atom, self.x.screen().root
+        active = root.get_full_property(atom("_NET_ACTIVE_WINDOW"), Xatom.WINDOW)
+        states = []
+        for pos, window in enumerate(windows):
+            wm_state = window.get_full_property(atom("WM_STATE"), atom("WM_STATE"))
+            net = window.get_full_property(atom("_NET_WM_STATE"), Xatom.ATOM)
+            wm = wm_state.value[0] if wm_state else 0
+            states.append({"pos": pos, "iconic": wm == 3, "visible": wm in (1, 3),
+                           "zoomed": bool(net) and atom("_NET_WM_STATE_MAXIMIZED_VERT") in net.value,
+                           "front": bool(active) and active.value[0] == window.id})
+        return states
 
     def close(self):
         for proc in reversed(self.procs):
@@ -64,12 +111,15 @@ class Watcher(threading.Thread):
 
     def run(self):
         while not self.stopping:
-            while self.x.pending_events():
-                self.handle(self.x.next_event())
-            for dialog, at in list(self.pending):
-                if time.monotonic() >= at:
-                    self.pending.remove((dialog, at))
-                    self.dismiss(dialog)
+            try:
+                while self.x.pending_events():
+                    self.handle(self.x.next_event())
+                for dialog, at in list(self.pending):
+                    if time.monotonic() >= at:
+                        self.pending.remove((dialog, at))
+                        self.dismiss(dialog)
+            except xerror.XError:
+                pass  # a window that went while we looked; the watch goes on
             select.select([self.x.fileno()], [], [], 0.02)
 
     def handle(self, event):
@@ -108,7 +158,7 @@ class Watcher(threading.Thread):
         window = dialog["window"]
         for _ in range(40):
             focus = self.x.get_input_focus().focus
-            dialog["focus"] = focus == window or (hasattr(focus, "query_tree") and focus.query_tree().parent == window)
+            dialog["focus"] = focus == window
             if dialog["focus"]:
                 break
             time.sleep(0.05)
