@@ -131,7 +131,7 @@ class Watcher(threading.Thread):
                 if kind == "splash" and self.splash is None:
                     geometry = event.window.get_geometry()
                     at = self.root.translate_coords(event.window, 0, 0)
-                    self.splash = {"window": event.window, "t": self.now(), "gone": None, "alphas": [],
+                    self.splash = {"window": event.window, "t": self.now(), "wall": time.time() * 1000, "gone": None, "alphas": [],
                                    "rect": [at.x, at.y, geometry.width, geometry.height]}
                     self.read_opacity(event.window)
                 elif kind == "dialog":
