@@ -6,7 +6,7 @@
 set -u
 build=${1:-build}
 jobs=$(nproc)
-passed=0; failed=0; tested=(); skipped=(); notrun=(); status=0
+passed=0; failed=0; skips=0; tested=(); skipped=(); notrun=(); status=0
 
 run_suite() {  # name dir [ctest args...]
   local name=$1 dir=$2; shift 2
@@ -37,9 +37,10 @@ run_table() {  # platform
   unshare -n sh -c "ip link set lo up" 2>/dev/null && isolate=(unshare -n)
   "${isolate[@]}" sh -c "ip link set lo up 2>/dev/null; $cmd" 2>&1 | tee "$out"
   local rc=${PIPESTATUS[0]} line n before=$failed
-  line=$(grep -E '[0-9]+ (passed|failed|errors?) ' "$out" | tail -n 1)
+  line=$(grep -E '[0-9]+ (passed|failed|errors?|skipped).* in [0-9.]+s' "$out" | tail -n 1)
   for n in $(grep -oE '[0-9]+ passed' <<<"$line" | grep -oE '^[0-9]+'); do passed=$((passed + n)); done
   for n in $(grep -oE '[0-9]+ (failed|errors?)' <<<"$line" | grep -oE '^[0-9]+'); do failed=$((failed + n)); done
+  for n in $(grep -oE '[0-9]+ skipped' <<<"$line" | grep -oE '^[0-9]+'); do skips=$((skips + n)); done
   rm -f "$out"
   [ "$rc" -eq 0 ] || { status=1; [ "$failed" -gt "$before" ] || failed=$((failed + 1)); }
 }
@@ -83,5 +84,6 @@ echo
 echo "Windows architectures tested under Wine: ${tested[*]:-none}${skipped:+ (not tested: ${skipped[*]})}"
 for line in "${notrun[@]}"; do echo "$line"; done
 [ ${#tested[@]} -gt 0 ] || { echo "no Windows architecture was tested"; status=1; }
-echo "all suites: $passed passed, $failed failed"
+echo "(skipped: tests that need the Java test application, which only the Linux build hosts)"
+echo "all suites: $passed passed, $failed failed, $skips skipped"
 exit $status
