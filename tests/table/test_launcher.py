@@ -1,7 +1,9 @@
 """The launcher's behaviour as one table of scenarios: each row gives the inputs of one launch and what
 must come out of it. Rows run on every platform unless `only` names one (platform-specific inputs:
 argv[0], Windows folders, windows on screen, a debugger)."""
+import os
 import re
+from pathlib import Path
 
 import pytest
 from Xlib import Xatom
@@ -292,6 +294,12 @@ def test_lock_not_inherited_by_programs_java_starts(platform):
     assert out.code == 0 and "end" in out.record.lines
     again = platform.start(platform.app(vm=dict(until="stop")), ["-noSplash"], display=False)
     assert again.wait_main()
+    # Java's own process launcher closes what a child would inherit; other programs need the lock's
+    # descriptor to be closed on exec.
+    fds = Path(f"/proc/{again.process.pid}/fd")
+    lock_fds = [fd.name for fd in fds.iterdir() if os.readlink(fd).endswith(".lock")]
+    assert lock_fds and all(int(re.search(r"flags:\s*(\d+)", (fds.parent / "fdinfo" / fd).read_text()).group(1), 8) & 0o2000000
+                            for fd in lock_fds)
     again.process.kill()
     again.finish()
     assert platform.run(platform.app(), ["-noSplash"], display=False).record.args == [hexed("-noSplash")]
