@@ -21,6 +21,7 @@ BASE_PKGS=(
   openbox wmctrl fonts-symbola              # the Linux desktop: window manager, demo, emoji glyphs
   libx11-6 libxext6 libxi6 libxrender1 libxtst6  # what the private runtime's Swing needs at run time
   python3-pytest python3-xlib strace iproute2 util-linux  # the scenario table, in network namespaces of its own
+  python3-matplotlib time                   # make bench: the plot, peak memory
   clang libclang-rt-dev  # libFuzzer, for the fuzz target in tests/fuzz
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
 )
