@@ -99,7 +99,7 @@ class Watcher(threading.Thread):
         self.root = self.x.screen().root
         self.root.change_attributes(event_mask=X.SubstructureNotifyMask)
         self.x.sync()
-        self.splash, self.dialogs, self.pending = None, [], []
+        self.splash, self.dialogs, self.pending, self.shown = None, [], [], set()
         self.start()
 
     def now(self):
@@ -126,25 +126,34 @@ class Watcher(threading.Thread):
         try:
             if event.type == X.CreateNotify and event.parent == self.root:
                 event.window.change_attributes(event_mask=X.PropertyChangeMask | X.StructureNotifyMask)
+                if event.window.get_attributes().map_state != X.IsUnmapped:  # mapped before we looked
+                    self.mapped(event.window)
             elif event.type == X.MapNotify and event.window == event.event:
-                kind = self.kind(event.window)
-                if kind == "splash" and self.splash is None:
-                    geometry = event.window.get_geometry()
-                    at = self.root.translate_coords(event.window, 0, 0)
-                    self.splash = {"window": event.window, "t": self.now(), "wall": time.time() * 1000, "gone": None, "alphas": [],
-                                   "rect": [at.x, at.y, geometry.width, geometry.height]}
-                    self.read_opacity(event.window)
-                elif kind == "dialog":
-                    title = event.window.get_full_property(self.title, X.AnyPropertyType)
-                    self.dialogs.append({"window": event.window, "t": self.now(), "caption": title.value.decode() if title else None,
-                                         "splash": self.splash is not None and self.splash["gone"] is None, "focus": False})
-                    self.pending.append((self.dialogs[-1], time.monotonic() + 0.3))
+                self.mapped(event.window)
             elif event.type == X.PropertyNotify and event.atom == self.opacity:
                 self.read_opacity(event.window)
-            elif event.type in (X.UnmapNotify, X.DestroyNotify) and self.splash and event.window == self.splash["window"]:
-                self.splash["gone"] = self.splash["gone"] or self.now()
+            elif event.type in (X.UnmapNotify, X.DestroyNotify):
+                self.shown.discard(event.window.id)
+                if self.splash and event.window == self.splash["window"]:
+                    self.splash["gone"] = self.splash["gone"] or self.now()
         except xerror.XError:
             pass  # a window that went while we looked
+
+    def mapped(self, window):
+        if window.id in self.shown:
+            return
+        self.shown.add(window.id)
+        kind = self.kind(window)
+        if kind == "splash" and self.splash is None:
+            geometry, at = window.get_geometry(), self.root.translate_coords(window, 0, 0)
+            self.splash = {"window": window, "t": self.now(), "wall": time.time() * 1000, "gone": None, "alphas": [],
+                           "rect": [at.x, at.y, geometry.width, geometry.height]}
+            self.read_opacity(window)
+        elif kind == "dialog":
+            title = window.get_full_property(self.title, X.AnyPropertyType)
+            self.dialogs.append({"window": window, "t": self.now(), "caption": title.value.decode() if title else None,
+                                 "splash": self.splash is not None and self.splash["gone"] is None, "focus": False})
+            self.pending.append((self.dialogs[-1], time.monotonic() + 0.3))
 
     def read_opacity(self, window):
         if self.splash and window == self.splash["window"]:
