@@ -146,7 +146,7 @@ class Watcher(threading.Thread):
         kind = self.kind(window)
         if kind == "splash" and self.splash is None:
             geometry, at = window.get_geometry(), self.root.translate_coords(window, 0, 0)
-            self.splash = {"window": window, "t": self.now(), "wall": time.time() * 1000, "gone": None, "alphas": [],
+            self.splash = {"window": window, "t": self.now(), "gone": None, "alphas": [],
                            "rect": [at.x, at.y, geometry.width, geometry.height]}
             self.read_opacity(window)
         elif kind == "dialog":

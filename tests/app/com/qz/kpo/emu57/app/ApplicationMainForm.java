@@ -9,9 +9,8 @@ import java.util.*;
 
 // The scenario table's Java application: records what the launcher gave it in vm-record.txt of the
 // current directory and behaves as vm-script.txt asks (the line formats are the VM double's, see
-// tests/table/conftest.py). Linux only adds: "started MS" (wall clock at main's entry), "property
-// java.class.path V" (the VM keeps that option out of its input arguments), "cwd PATH", and
-// "received TEXT" for each hand-off on port 6152.
+// tests/table/conftest.py). Linux only adds: "property java.class.path V" (the VM keeps that option
+// out of its input arguments), "cwd PATH", and "received TEXT" for each hand-off on port 6152.
 //   script keys: main_ms=N  until=NAME  exit=N  throw=1  listen=1 (take hand-offs while running)
 //                child=1 (start a process that outlives the application)
 //                frame=1 (open a frame titled with the instance name's nine-unit form; closed at the end)
@@ -24,9 +23,7 @@ public final class ApplicationMainForm {
             script.load(in);
         } catch (NoSuchFileException absent) {
         }
-        long started = System.currentTimeMillis();
         record = new PrintStream(new FileOutputStream("vm-record.txt", true), true, "UTF-8");
-        record.println("started " + started);
         for (String option : ManagementFactory.getRuntimeMXBean().getInputArguments()) record.println("option " + option);
         record.println("property java.class.path " + System.getProperty("java.class.path"));
         record.println("cwd " + System.getProperty("user.dir"));
