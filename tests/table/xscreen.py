@@ -5,6 +5,7 @@ had the keyboard focus and the splash was still up), dismissing each dialog with
 import os
 import select
 import subprocess
+import tempfile
 import threading
 import time
 
@@ -15,20 +16,12 @@ from Xlib.protocol import event as xevent
 
 class Display:
     def __init__(self):
-        read, write = os.pipe()
-        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
-                                       pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
-        os.close(write)
-        self.name = ":" + os.read(read, 16).decode().strip()
-        os.close(read)
-        for attempt in range(300):  # the number can come a while before the server takes connections
-            try:
-                self.x = xdisplay.Display(self.name)
+        for attempt in range(3):  # an X server that gives up at start (seen rarely) is started again
+            if self.start_server():
                 break
-            except xerror.DisplayConnectionError:
-                if attempt == 299 or self.procs[0].poll() is not None:
-                    raise
-                time.sleep(0.1)
+            self.procs[0].wait()
+        else:
+            raise RuntimeError("Xvfb did not start: " + open(self.errors.name, errors="replace").read())
         env = {**os.environ, "DISPLAY": self.name}
         for wm in (["openbox"], ["xcompmgr"]):
             self.procs.append(subprocess.Popen(wm, env=env, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL))
@@ -37,6 +30,28 @@ class Display:
             if self.x.screen().root.get_full_property(self.x.intern_atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType):
                 break
             time.sleep(0.05)
+
+    def start_server(self):
+        """Xvfb on the first free display number it finds (-displayfd), once it takes connections."""
+        read, write = os.pipe()
+        self.errors = tempfile.NamedTemporaryFile("w+", prefix="xvfb.")
+        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
+                                       pass_fds=[write], stdout=subprocess.DEVNULL, stderr=self.errors)]
+        os.close(write)
+        self.name = ":" + os.read(read, 16).decode().strip()
+        os.close(read)
+        if self.name == ":":  # it ended before it chose a number
+            return False
+        for _ in range(300):  # the number can come a while before the server takes connections
+            try:
+                self.x = xdisplay.Display(self.name)
+                return True
+            except xerror.DisplayError:
+                if self.procs[0].poll() is not None:
+                    return False
+                time.sleep(0.1)
+        self.procs[0].terminate()
+        return False
 
     def ask_wm(self, window, message, *data):
         """A client message to the window manager about `window`, as pagers and taskbars send them."""
