@@ -6,13 +6,14 @@
 #   make test   build everything and run every test (host unit tests, the scenario table on Linux
 #               with the real JVM, and under Wine on each architecture this machine can run)
 #   make bench  start-up figures beside the alternatives (docs/performance.md)
+#   make fuzz   ten million runs of each fuzz target (picture reader, UTF-8 decoding, argument encoding)
 #   make size   print the size report of the release launchers
 BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_FLAGS ?= -G Ninja -DCMAKE_BUILD_TYPE=Release
 LINUX_DIST = dist/linux-x86_64
 
-.PHONY: all deps demo dist dist-linux dist-windows test bench size clean
+.PHONY: all deps demo dist dist-linux dist-windows test bench fuzz size clean
 
 all: dist
 
@@ -48,6 +49,14 @@ test: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja $(BUILD)/linux/build
 bench: dist-linux $(BUILD)/x86_64/build.ninja
 	cmake --build $(BUILD)/x86_64 -j $(JOBS) --target launcher vmdouble
 	/usr/bin/python3 tools/bench/bench.py --build $(BUILD)
+
+# Ten million runs of each libFuzzer target (CI runs each for 20 s); new inputs go to long-<name>/.
+FUZZERS = splash_bitmap utf8 encode_argument
+fuzz: $(BUILD)/linux/build.ninja
+	cmake --build $(BUILD)/linux -j $(JOBS) $(addprefix --target fuzz_,$(FUZZERS))
+	cd $(BUILD)/linux/tests/fuzz && for f in $(FUZZERS); do mkdir -p long-$$f && \
+	  ./$${f}_fuzzer -runs=10000000 -seed=1 -max_len=4096 -print_final_stats=1 long-$$f \
+	    $$([ $$f = splash_bitmap ] && echo seeds) || exit 1; done
 
 size:
 	bash tools/size-report.sh $(BUILD)
