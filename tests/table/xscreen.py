@@ -61,11 +61,11 @@ class Display:
         root.send_event(event, event_mask=X.SubstructureRedirectMask | X.SubstructureNotifyMask)
         self.x.sync()
 
-    def make_windows(self, specs):
+    def make_windows(self, wanted):
         """Top-level windows (state, WM_CLASS, _NET_WM_NAME): state "i" minimised, "z" maximised,
         "h" never shown, anything else normal. Returns them once the window manager has them."""
         atom, root, windows = self.x.intern_atom, self.x.screen().root, []
-        for state, cls, title in specs:
+        for state, cls, title in wanted:
             window = root.create_window(50, 50, 300, 200, 0, X.CopyFromParent)
             window.set_wm_class(cls, cls)
             if title:
@@ -75,7 +75,7 @@ class Display:
             windows.append(window)
         self.x.sync()
         time.sleep(0.5)
-        for window, (state, _, _) in zip(windows, specs):
+        for window, (state, _, _) in zip(windows, wanted):
             if state == "z":
                 self.ask_wm(window, "_NET_WM_STATE", 1, atom("_NET_WM_STATE_MAXIMIZED_VERT"), atom("_NET_WM_STATE_MAXIMIZED_HORZ"))
             elif state == "i":

@@ -117,8 +117,8 @@ struct Saved {
     BYTE data[2048];
 };
 std::vector<Saved> g_saved;
-void Redirect(const std::wstring& spec) {
-    std::wstring name = spec.substr(0, spec.find(L'=')), path = spec.substr(spec.find(L'=') + 1);
+void Redirect(const std::wstring& folder) {
+    std::wstring name = folder.substr(0, folder.find(L'=')), path = folder.substr(folder.find(L'=') + 1);
     g_saved.push_back({name == L"Common AppData" ? HKEY_LOCAL_MACHINE : HKEY_CURRENT_USER, name, 0, 0, 2048, {}});
     Saved& s = g_saved.back();
     s.had = RegGetValueW(s.root, kFolders, name.c_str(), RRF_RT_ANY | RRF_NOEXPAND, &s.type, s.data, &s.size);
