@@ -5,6 +5,7 @@
 // Main thread only, on a connection of its own (the splash thread may be running on another).
 // Nothing here may stall the launch for good: a lost connection ends the dialog at once.
 #include "messages.h"
+#include "xconnection_x11.h"
 
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
@@ -23,31 +24,7 @@ struct DialogLine {
     int units;
 };
 
-Display* volatile gDisplay = nullptr;
-volatile bool gXFailed = false;
-volatile bool gConnectionLost = false;
-XErrorHandler gPreviousErrorHandler = nullptr;
-XIOErrorHandler gPreviousIoHandler = nullptr;
-
-// The process-wide Xlib error handler claims only the dialog connection's errors and hands the
-// others (the splash thread's, the Java toolkit's) to the handler it replaced.
-int RecordXError(Display* display, XErrorEvent* error) {
-    if (display == gDisplay) {
-        gXFailed = true;
-        return 0;
-    }
-    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
-}
-
-// A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
-// (its default one exits), then the connection's own exit handler (its default one exits too); ours
-// both return for our connection, so Xlib gives up on it quietly and the dialog ends.
-int QuietIoError(Display* display) {
-    if (display != gDisplay) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
-    gConnectionLost = true;
-    return 0;
-}
-void RecordIoError(Display*, void*) { gConnectionLost = true; }
+XConnection gConnection;  // the dialog's own; main thread only
 
 // The text as UTF-16 (narrow text is UTF-8 here; bytes that are not are shown as Latin-1).
 char16_t* WidenText(const char* text) {
@@ -160,10 +137,10 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
     XMapRaised(display, window);
     XSync(display, False);
     bool shown = false;
-    bool done = gXFailed || gConnectionLost;  // the window could not be made
+    bool done = gConnection.failed || gConnection.lost;  // the window could not be made
     bool pressedOnButton = false;
     while (!done) {
-        while (!done && !gConnectionLost && XPending(display) > 0) {
+        while (!done && !gConnection.lost && XPending(display) > 0) {
             XEvent event;
             XNextEvent(display, &event);
             if (event.type == MapNotify && !shown) {
@@ -203,12 +180,12 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
                 done = true;  // someone else destroyed it
             }
         }
-        if (gConnectionLost) break;
+        if (gConnection.lost) break;
         XFlush(display);
         pollfd fd = {ConnectionNumber(display), POLLIN, 0};
         if (!done) poll(&fd, 1, -1);
     }
-    if (!gConnectionLost) {
+    if (!gConnection.lost) {
         XFreeGC(display, gc);
         XDestroyWindow(display, window);
         XSync(display, False);
@@ -219,16 +196,8 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
 }  // namespace
 
 bool ShowErrorDialog(const char* caption, const char* text) {
-    XInitThreads();
-    Display* display = XOpenDisplay(nullptr);
-    if (display == nullptr) return false;
-    gDisplay = display;
-    gXFailed = gConnectionLost = false;
-    XSetIOErrorExitHandler(display, RecordIoError, nullptr);
-    XErrorHandler previous = XSetErrorHandler(RecordXError);
-    if (previous != RecordXError) gPreviousErrorHandler = previous;
-    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
-    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
+    if (!OpenXConnection(&gConnection)) return false;
+    Display* display = gConnection.display;
 
     // A Unicode face of the core "fixed" font where the server has one, else "fixed" itself.
     XFontStruct* font = XLoadQueryFont(display, "-misc-fixed-medium-r-semicondensed--13-*-*-*-*-*-iso10646-1");
@@ -240,8 +209,7 @@ bool ShowErrorDialog(const char* caption, const char* text) {
         shown = RunDialog(display, font, caption != nullptr ? caption : "Error", lines, WrapText(wide, lines));
     }
     free(wide);
-    if (font != nullptr && !gConnectionLost) XFreeFont(display, font);
-    XCloseDisplay(display);
-    gDisplay = nullptr;
+    if (font != nullptr && !gConnection.lost) XFreeFont(display, font);
+    CloseXConnection(&gConnection);
     return shown;
 }

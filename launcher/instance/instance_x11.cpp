@@ -8,6 +8,8 @@
 // connection ends the walk.
 #include "instance.h"
 
+#include "../core/xconnection_x11.h"
+
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
 #include <X11/Xutil.h>
@@ -19,29 +21,6 @@ namespace {
 const size_t kClassUnits = 1024;  // the most of a class name that is compared
 const int kActivationChecks = 25;
 const useconds_t kActivationCheckUs = 10000;
-
-Display* volatile gDisplay = nullptr;
-volatile bool gConnectionLost = false;
-XErrorHandler gPreviousErrorHandler = nullptr;
-XIOErrorHandler gPreviousIoHandler = nullptr;
-
-// The process-wide Xlib error handler ignores our own connection's errors (a window that went away
-// mid-walk: BadWindow; the call that met it fails and the window fails its test) and hands the
-// others on to the handler it replaced.
-int IgnoreXError(Display* display, XErrorEvent* error) {
-    if (display == gDisplay) return 0;
-    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
-}
-
-// A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
-// (its default one exits), then the connection's own exit handler (its default one exits too); ours
-// both return for our connection, so Xlib gives up on it quietly and the walk ends.
-int QuietIoError(Display* display) {
-    if (display != gDisplay) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
-    gConnectionLost = true;
-    return 0;
-}
-void RecordIoError(Display*, void*) { gConnectionLost = true; }
 
 // The first 32-bit item of property `name` of type `type` (both by name), or 0.
 long FirstItem(Display* display, Window window, const char* name, const char* type) {
@@ -136,16 +115,11 @@ void ActivateIfFrame(Display* display, Window root, Window window, bool managed)
 }  // namespace
 
 void ActivateRunningInstances() {
-    XInitThreads();
-    Display* display = XOpenDisplay(nullptr);
-    if (display == nullptr) return;
-    gDisplay = display;
-    gConnectionLost = false;
-    XSetIOErrorExitHandler(display, RecordIoError, nullptr);
-    XErrorHandler previous = XSetErrorHandler(IgnoreXError);
-    if (previous != IgnoreXError) gPreviousErrorHandler = previous;
-    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
-    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
+    // Errors of our own requests (a window that went away mid-walk: BadWindow) only make that
+    // window fail its test; a lost connection ends the walk.
+    XConnection connection;
+    if (!OpenXConnection(&connection)) return;
+    Display* display = connection.display;
 
     // The window manager's client list when a live EWMH manager (its check window names itself)
     // keeps one; otherwise the root's children, stacked bottom to top.
@@ -171,13 +145,12 @@ void ActivateRunningInstances() {
         count = XQueryTree(display, root, &root, &parent, &children, &n) != 0 ? n : 0;
         windows = children;
     }
-    for (unsigned long i = 0; i < count && !gConnectionLost; ++i) {
+    for (unsigned long i = 0; i < count && !connection.lost; ++i) {
         ActivateIfFrame(display, root, windows[i], managed);
         XSync(display, False);  // a vanished window's late errors arrive here, not with the next one
     }
     if (list != nullptr) XFree(list);
     if (children != nullptr) XFree(children);
     XSync(display, False);
-    XCloseDisplay(display);
-    gDisplay = nullptr;
+    CloseXConnection(&connection);
 }

@@ -12,6 +12,8 @@
 // X error means no splash, and the launch goes on.
 #include "splash.h"
 
+#include "../core/xconnection_x11.h"
+
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
 #include <X11/Xutil.h>
@@ -38,33 +40,11 @@ pthread_t gThread;
 int gWakePipe[2] = {-1, -1};
 SplashParams gParams;  // written before the thread starts, read-only afterwards
 
-// Splash thread only, apart from the error handler's check of gDisplay (see RecordXError).
-Display* volatile gDisplay = nullptr;
-volatile bool gXFailed = false;
-XErrorHandler gPreviousErrorHandler = nullptr;
-XIOErrorHandler gPreviousIoHandler = nullptr;
+XConnection gConnection;  // the splash thread's own
 int gFadeAlpha = kSplashFirstAlpha;  // never reset: one splash per process
 
-// Xlib has one error handler for the whole process, and the error dialog and the Java toolkit set
-// theirs too. Ours claims only the errors of the splash's own connection (they are reported on the
-// splash thread) and hands every other one to the handler it replaced.
-int RecordXError(Display* display, XErrorEvent* error) {
-    if (display == gDisplay) {
-        gXFailed = true;
-        return 0;
-    }
-    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
-}
-
-// A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
-// (its default one exits), then the connection's own exit handler (its default one exits too); ours
-// both return for our connection, so Xlib gives up on it quietly and the splash ends.
-int QuietIoError(Display* display) {
-    if (display != gDisplay) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
-    gXFailed = true;
-    return 0;
-}
-void RecordIoError(Display*, void*) { gXFailed = true; }
+// Any error of the splash's own connection, or its loss, ends the splash quietly.
+bool XFailed() { return gConnection.failed || gConnection.lost; }
 
 int64_t NowMs() {
     timespec now;
@@ -181,7 +161,7 @@ void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity,
             else SetOpacity(display, window, opacity, alpha);
             nextFade = now + kSplashFadeIntervalMs;
         }
-        while (!gXFailed && XPending(display) > 0) {  // XPending also sends what is queued
+        while (!XFailed() && XPending(display) > 0) {  // XPending also sends what is queued
             XEvent event;
             XNextEvent(display, &event);
             if (event.type == Expose && image != nullptr) {
@@ -191,7 +171,7 @@ void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity,
             }
         }
         XFlush(display);
-        if (gXFailed) break;
+        if (XFailed()) break;
         int64_t wakeAt = fading && nextFade < closeAt ? nextFade : closeAt;
         pollfd fds[2] = {{ConnectionNumber(display), POLLIN, 0}, {gWakePipe[0], POLLIN, 0}};
         int timeout = static_cast<int>(wakeAt - NowMs());
@@ -208,18 +188,12 @@ void ShowSplash(const SplashParams& params) {
     if (!FindLinkedSplashPicture(params.resourceName, &data, &size) || !ReadSplashBitmap(data, size, &info)) return;
     if (info.width <= 0 || info.height <= 0 || info.width > 32767 || info.height > 32767) return;
 
-    Display* display = XOpenDisplay(nullptr);
-    if (display == nullptr) return;
+    if (!OpenXConnection(&gConnection)) return;
+    Display* display = gConnection.display;
     if (!UsableVisual(display)) {
-        XCloseDisplay(display);
+        CloseXConnection(&gConnection);
         return;
     }
-    gDisplay = display;
-    XSetIOErrorExitHandler(display, RecordIoError, nullptr);
-    XErrorHandler previous = XSetErrorHandler(RecordXError);
-    if (previous != RecordXError) gPreviousErrorHandler = previous;
-    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
-    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
 
     XImage* image = MakeSplashImage(display, data, size, info);
     Window window = CreateSplashWindow(display, params, info, image != nullptr);
@@ -230,7 +204,7 @@ void ShowSplash(const SplashParams& params) {
     // The display time counts from here, fade included.
     int64_t closeAt = NowMs() + params.displayMs;
     int expected = kPreparing;
-    if (!gXFailed && gState.compare_exchange_strong(expected, kShowing)) {
+    if (!XFailed() && gState.compare_exchange_strong(expected, kShowing)) {
         XMapWindow(display, window);
         RunSplashLoop(display, window, image, opacity, closeAt);
         XUnmapWindow(display, window);
@@ -238,8 +212,7 @@ void ShowSplash(const SplashParams& params) {
     XDestroyWindow(display, window);
     XSync(display, False);
     if (image != nullptr) XDestroyImage(image);
-    XCloseDisplay(display);
-    gDisplay = nullptr;
+    CloseXConnection(&gConnection);
 }
 
 void* SplashThreadProc(void*) {
@@ -263,7 +236,7 @@ void SplashStart(const SplashParams* params) {
     // Without a display there is nothing to show: no thread, no Xlib.
     const char* display = getenv("DISPLAY");
     if (display == nullptr || display[0] == 0) return;
-    XInitThreads();           // before any other Xlib call: the splash thread and the main thread both use Xlib
+    XInitThreads();  // on the main thread, before the splash thread makes its first Xlib call
     if (pipe2(gWakePipe, O_CLOEXEC | O_NONBLOCK) != 0) return;
     gParams = *params;
     gState = kPreparing;
