@@ -51,12 +51,12 @@ bench: dist-linux $(BUILD)/x86_64/build.ninja
 	/usr/bin/python3 tools/bench/bench.py --build $(BUILD)
 
 # Ten million runs of each libFuzzer target (CI runs each for 20 s); new inputs go to long-<name>/.
-FUZZERS = splash_bitmap utf8 encode_argument
+FUZZERS = Picture Utf8 Encode
 fuzz: $(BUILD)/linux/build.ninja
-	cmake --build $(BUILD)/linux -j $(JOBS) $(addprefix --target fuzz_,$(FUZZERS))
-	cd $(BUILD)/linux/tests/fuzz && for f in $(FUZZERS); do mkdir -p long-$$f && \
-	  ./$${f}_fuzzer -runs=10000000 -seed=1 -max_len=4096 -print_final_stats=1 long-$$f \
-	    $$([ $$f = splash_bitmap ] && echo seeds) || exit 1; done
+	cmake --build $(BUILD)/linux -j $(JOBS) $(addprefix --target build_fuzz_,$(FUZZERS))
+	cd $(BUILD)/linux/tests/host && ./units --seeds seeds && for f in $(FUZZERS); do mkdir -p long-$$f && \
+	  ./fuzz_$$f -runs=10000000 -seed=1 -max_len=4096 -print_final_stats=1 long-$$f \
+	    $$([ $$f = Picture ] && echo seeds) || exit 1; done
 
 size:
 	bash tools/size-report.sh $(BUILD)

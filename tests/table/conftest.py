@@ -1,33 +1,36 @@
-"""The launcher's scenario table: shared pieces and the platform fixture.
+"""The scenario table's shared pieces: the hand-off listener, the VM record, the platform fixture and
+what both platforms (wine.py: a Windows build under Wine with the VM double; linux.py: the Linux
+build with the real JVM) do alike.
 
-A platform (wine.py; linux.py later) offers: name; app(runtime="double"|"none"|"noentry"|"dep",
-strings=True, vm={script}, suffix="", altered=False) -> App (a fresh application directory, .record());
-run(app, args, **inputs) -> Outcome; start(...) -> Running (.wait_main(), .stop() -> Outcome);
-read_log(); fixed_options(app_dir) and folder_options(). Inputs: argv0 (App or text), cwd="app",
-lock (another instance holds the lock), listener (a Listener; else nobody listens), folders
-({"Personal"|"AppData"|"Common AppData": path, None: unusable}), windows [(state, class, title)],
-debug, splash (boxes wait for a splash), log ("junk": a long old log first, "nofolder", "keep").
+A platform offers app(runtime="double"|"none"|"noentry"|"dep", strings=True, vm={script}, suffix="",
+altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running (.wait_main(),
+.stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
+cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
+unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
+long old log first, "nofolder", "keep"); Linux also display=False.
 
-VM script, vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM
-result), missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME
-exists), exit=N (main ends the process, as System.exit), destroy=N (DestroyJavaVM result).
-
-VM record, vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT" per VM
-option; "call NAME ..." per JNI call (the Windows double only; " -> null" when scripted to fail);
-"main N" when main starts with N arguments, then "arg TEXT" per element (encoded); "end" when main
-returns; "trap jni|invoke N" when the launcher used a function it must not (exit 0xDEAD0000 + N).
+vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
+missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
+exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw, listen, child, frame.
+vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
+JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
+(encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
 """
+import itertools
 import os
 import select
+import shutil
 import socket
 import struct
 import subprocess
 import threading
 import time
+from pathlib import Path
 
 import pytest
 
 PORT = 6152
+LOG = "QZ-LumiscopeQZ-57Nova/logs/QZ-LumiscopeQZ-57Nova-L.log"
 
 
 class Record:
@@ -35,6 +38,15 @@ class Record:
         self.lines = data.decode("latin-1").splitlines()
         self.options, self.calls, self.args = ([line[len(head):] for line in self.lines if line.startswith(head)]
                                                for head in ("option ", "call ", "arg "))
+
+
+class App:
+    def __init__(self, path, native, exe):
+        self.path, self.native, self.exe = path, native, exe
+
+    def record(self):
+        file = self.path / "vm-record.txt"
+        return Record(file.read_bytes()) if file.exists() else None
 
 
 class Listener:  # the running application's end of the hand-off: keeps what arrives until the sender
@@ -80,33 +92,76 @@ def port_free():  # bound to the hand-off port, or the row fails: rows must not 
     pytest.fail(f"port {PORT} is taken by another program")
 
 
+class Platform:
+    """What both platforms share: application folders, the log, the option list, run = start + finish."""
+    def __init__(self, name, apps, docs, separator):
+        self.name, self.apps, self.docs, self.sep, self.counter = name, apps, docs, separator, itertools.count()
+
+    def new_app(self, suffix, vm):
+        path = self.apps / f"{next(self.counter)}{suffix}"
+        path.mkdir(parents=True)
+        (path / "vm-script.txt").write_text("".join(f"{k}={v}\n" for k, v in (vm or {}).items()))
+        return path
+
+    def fixed_options(self, app_dir):
+        return [f"-Djava.class.path={app_dir}{self.sep}emu57.jar", "-Xms64m", "-Xmx256m", "-Dswing.aatext=true",
+                "-DencodedFilenames=true", "-Dsun.locale.formatasdefault=true", f"-Djava.library.path={app_dir}",
+                "-DconsoleLogLevel=ALL", "-DfileLogLevel=INFO", "-DjniFileLogLevel=3"]
+
+    def read_log(self):
+        file = self.docs / LOG
+        return file.read_bytes() if file.exists() else None
+
+    def reset_log(self, how):
+        folder = (self.docs / LOG).parent
+        if how == "junk":
+            folder.mkdir(parents=True, exist_ok=True)
+            (self.docs / LOG).write_bytes(b"x" * 65536)
+        elif how == "nofolder":
+            shutil.rmtree(folder, ignore_errors=True)
+
+    def log_folder(self):
+        return (self.docs / LOG).parent.exists()
+
+    def run(self, app, args=(), **inputs):
+        return self.start(app, args, **inputs).finish()
+
+
+class Running:
+    def __init__(self, app, process):
+        self.app, self.process = app, process
+
+    def wait_main(self):
+        for _ in range(600):
+            if any(line.startswith("main ") for line in (self.app.record() or Record(b"")).lines):
+                return True
+            time.sleep(0.1)
+        return False
+
+    def stop(self):
+        (self.app.path / "stop").write_bytes(b"")
+        return self.finish()
+
+
 def pytest_addoption(parser):
     parser.addoption("--build", default="build", help="build folder with one subfolder per architecture")
-    parser.addoption("--platforms", default="", help="comma-separated, e.g. wine-x86_64; default: what runs here")
-
-
-def runnable_platforms():
-    loaders = {"wine-i686": "/usr/lib/wine/wine", "wine-x86_64": "/usr/lib/wine/wine64"}
-    return ["linux-x86_64"] * (os.uname().machine == "x86_64") + [
-        name for name, loader in loaders.items() if subprocess.run([loader, "--version"], capture_output=True).returncode == 0]
+    parser.addoption("--platforms", default="", help="comma-separated, e.g. linux-x86_64,wine-x86_64; default: what runs here")
 
 
 def pytest_generate_tests(metafunc):
-    if "platform" not in metafunc.fixturenames:
-        return
-    names = [p for p in metafunc.config.getoption("platforms").split(",") if p] or runnable_platforms()
-    rows = getattr(metafunc.module, "ROWS", None)
+    names = [p for p in metafunc.config.getoption("platforms").split(",") if p] or ["linux-x86_64"] + [
+        f"wine-{arch}" for arch, loader in (("i686", "wine"), ("x86_64", "wine64"))
+        if subprocess.run([f"/usr/lib/wine/{loader}", "--version"], capture_output=True).returncode == 0]
     if "row" in metafunc.fixturenames:
-        pairs = [(p, r) for p in names for r in rows if r.only is None or p.startswith(r.only)]
-        metafunc.parametrize(["platform", "row"], pairs, indirect=["platform"], scope="session",
-                             ids=[f"{p}-{r.name}" for p, r in pairs])
-    else:
+        pairs = [(p, r) for p in names for r in metafunc.module.ROWS if r.only is None or p.startswith(r.only)]
+        metafunc.parametrize(["platform", "row"], pairs, indirect=["platform"], scope="session", ids=[f"{p}-{r.name}" for p, r in pairs])
+    elif "platform" in metafunc.fixturenames:
         metafunc.parametrize("platform", names, indirect=True, scope="session")
 
 
 @pytest.fixture(scope="session")
 def platform(request):
     kind, arch = request.param.split("-", 1)
-    driver = __import__(kind).Platform(arch, request.config.getoption("build"))
+    driver = __import__(kind).Platform(arch, Path(request.config.getoption("build")))
     yield driver
     driver.close()

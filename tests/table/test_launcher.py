@@ -3,12 +3,12 @@ must come out of it. Rows run on every platform unless `only` names one (platfor
 argv[0], Windows folders, windows on screen, a debugger)."""
 import os
 import re
+import time
+from dataclasses import dataclass, field
 from pathlib import Path
 
 import pytest
 from Xlib import Xatom
-import time
-from dataclasses import dataclass, field
 
 from conftest import Listener, port_free
 
@@ -311,10 +311,10 @@ def test_second_start_raises_the_real_java_frame(platform):
     first = platform.start(platform.app(vm=dict(frame=1, listen=1, until="stop")), ["-noSplash"])
     try:
         assert first.wait_main()
-        for _ in range(100):
-            clients = screen.x.screen().root.get_full_property(screen.x.intern_atom("_NET_CLIENT_LIST"), Xatom.WINDOW)
-            frames = [screen.x.create_resource_object("window", w) for w in (clients.value if clients else [])]
-            frames = [w for w in frames if w.get_wm_class() == ("com-qz-kpo-emu57-app-ApplicationMainForm",) * 2]
+        for _ in range(100):  # the frame, once the window manager lists it
+            clients = screen.root.get_full_property(screen.atom("_NET_CLIENT_LIST"), Xatom.WINDOW)
+            frames = [w for w in map(screen.x.create_resource_object, ["window"] * len(clients.value), clients.value)
+                      if w.get_wm_class() == ("com-qz-kpo-emu57-app-ApplicationMainForm",) * 2] if clients else []
             if frames:
                 break
             time.sleep(0.1)
