@@ -43,7 +43,7 @@ demo: dist-linux
 	bash tools/demo.sh $(LINUX_DIST) demo-out
 
 test: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja $(BUILD)/linux/build.ninja
-	bash tools/run-tests.sh $(BUILD)
+	bash tests/run.sh $(BUILD)
 
 # Start-up figures (not a test): writes docs/performance.md and docs/performance.png.
 bench: dist-linux $(BUILD)/x86_64/build.ninja

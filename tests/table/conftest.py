@@ -1,21 +1,21 @@
-"""The scenario table's shared pieces: the hand-off listener, the VM record, the platform fixture and
-what both platforms (wine.py: a Windows build under Wine with the VM double; linux.py: the Linux
-build with the real JVM) do alike.
-
-A platform offers app(runtime="double"|"none"|"noentry"|"dep", strings=True, vm={script}, suffix="",
-altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running (.wait_main(),
-.stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
-cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
-unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
-long old log first, "nofolder", "keep"); Linux also display=False.
-
-vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
-missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
-exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw, listen, child, frame.
-vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
-JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
-(encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
-"""
+# The scenario table's shared pieces: the hand-off listener, the VM record, the platform fixture and
+# what both platforms (wine.py: a Windows build under Wine with the VM double; linux.py: the Linux
+# build with the real JVM) do alike.
+#
+# A platform offers app(runtime="double"|"none"|"noentry"|"dep", strings=True, vm={script}, suffix="",
+# altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running (.wait_main(),
+# .stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
+# cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
+# unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
+# long old log first, "nofolder", "keep"); Linux also display=False.
+#
+# vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
+# missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
+# exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw, listen, child, frame.
+# vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
+# JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
+# (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
+#
 import itertools
 import os
 import select
@@ -93,7 +93,7 @@ def port_free():  # bound to the hand-off port, or the row fails: rows must not 
 
 
 class Platform:
-    """What both platforms share: application folders, the log, the option list, run = start + finish."""
+    # What both platforms share: application folders, the log, the option list, run = start + finish.
     def __init__(self, name, apps, docs, separator):
         self.name, self.apps, self.docs, self.sep, self.counter = name, apps, docs, separator, itertools.count()
 

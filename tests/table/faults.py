@@ -1,6 +1,6 @@
-"""Planted faults: small patches to the launcher, each of which some rows of the table must catch.
-    tools/planted-faults.sh [NAME-PART...]   builds each (or those named) in a scratch copy (the Linux
-    build, or x86_64 under Wine for Windows code), runs the rows that can reach it, prints "N of N caught" """
+# Planted faults: small patches to the launcher, each of which some rows of the table must catch.
+# tools/planted-faults.sh [NAME-PART...]   builds each (or those named) in a scratch copy (the Linux
+# build, or x86_64 under Wine for Windows code), runs the rows that can reach it, prints "N of N caught"
 import re
 import shutil
 import subprocess

@@ -1,7 +1,7 @@
-"""The table's Linux platform: the Linux build hosting the real JVM of a private runtime
-(tools/make-jre.sh) with the Java test application of tests/app, on a private X display with a window
-manager (xscreen.py) or headless (display=False), in a home, runtime folder (the instance lock) and
-settings folders of the table's own."""
+# The table's Linux platform: the Linux build hosting the real JVM of a private runtime
+# (tools/make-jre.sh) with the Java test application of tests/app, on a private X display with a window
+# manager (xscreen.py) or headless (display=False), in a home, runtime folder (the instance lock) and
+# settings folders of the table's own.
 import fcntl
 import os
 import shutil

@@ -1,5 +1,5 @@
-"""The table's Windows platform: one architecture's build under Wine, in one prefix on a private X
-display (tests/wine/bed.sh), seen through probe.exe (tests/wine/probe.cpp) with the VM double."""
+# The table's Windows platform: one architecture's build under Wine, in one prefix on a private X
+# display (tests/wine/bed.sh), seen through probe.exe (tests/wine/probe.cpp) with the VM double.
 import shutil
 import struct
 import subprocess

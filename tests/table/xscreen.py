@@ -1,7 +1,7 @@
-"""What a user sees of the Linux launcher on an X display: a private Xvfb with a window manager
-(openbox) and a compositor, and a watcher that records, during one run, the splash window (its
-rectangle, the opacities it shows, when it came and went) and every dialog (its caption, whether it
-had the keyboard focus and the splash was still up), dismissing each with a real key press."""
+# What a user sees of the Linux launcher on an X display: a private Xvfb with a window manager
+# (openbox) and a compositor, and a watcher that records, during one run, the splash window (its
+# rectangle, the opacities it shows, when it came and went) and every dialog (its caption, whether it
+# had the keyboard focus and the splash was still up), dismissing each with a real key press.
 import os
 import select
 import subprocess
@@ -47,13 +47,13 @@ class Display:
             time.sleep(0.05)
 
     def ask_wm(self, window, message, *data):
-        """A client message to the window manager about `window`, as pagers and taskbars send them."""
+        # A client message to the window manager about `window`, as pagers and taskbars send them.
         event = xevent.ClientMessage(window=window, client_type=self.atom(message), data=(32, (list(data) + [0] * 5)[:5]))
         self.root.send_event(event, event_mask=X.SubstructureRedirectMask | X.SubstructureNotifyMask)
         self.x.sync()
 
     def make_windows(self, wanted):
-        """Top-level windows (state, WM_CLASS, _NET_WM_NAME): "i" minimised, "z" maximised, "h" never shown."""
+        # Top-level windows (state, WM_CLASS, _NET_WM_NAME): "i" minimised, "z" maximised, "h" never shown.
         windows = []
         for state, cls, title in wanted:
             windows.append(self.root.create_window(50, 50, 300, 200, 0, X.CopyFromParent))
@@ -73,7 +73,7 @@ class Display:
         return windows
 
     def window_states(self, windows):
-        """As a user would tell: minimised, shown at all, maximised, in front; pos: creation order."""
+        # As a user would tell: minimised, shown at all, maximised, in front; pos: creation order.
         active = self.root.get_full_property(self.atom("_NET_ACTIVE_WINDOW"), Xatom.WINDOW)
         states = []
         for pos, window in enumerate(windows):
@@ -152,7 +152,7 @@ class Watcher(threading.Thread):
             self.splash["alphas"].append(value.value[0] >> 24)
 
     def dismiss(self, dialog):
-        """Return, typed on the keyboard: it reaches the dialog only when the dialog took the focus."""
+        # Return, typed on the keyboard: it reaches the dialog only when the dialog took the focus.
         for _ in range(40):
             dialog["focus"] = self.x.get_input_focus().focus == dialog["window"]
             if dialog["focus"]:
