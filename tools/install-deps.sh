@@ -17,12 +17,12 @@ BASE_PKGS=(
   cmake ninja-build make python3 python3-pytest iproute2  # pytest: the scenario table (tests/table)
   g++-mingw-w64-i686 g++-mingw-w64-x86-64 binutils-mingw-w64-i686 binutils-mingw-w64-x86-64
   wine wine64 xvfb xdotool x11-utils imagemagick xcompmgr
-  googletest g++ libx11-dev
+  g++ libx11-dev
   openbox wmctrl fonts-symbola              # the Linux desktop: window manager, demo, emoji glyphs
   libx11-6 libxext6 libxi6 libxrender1 libxtst6  # what the private runtime's Swing needs at run time
   python3-pytest python3-xlib strace iproute2 util-linux  # the scenario table, in network namespaces of its own
   python3-matplotlib time                   # make bench: the plot, peak memory
-  clang libclang-rt-dev  # libFuzzer, for the fuzz target in tests/fuzz
+  clang libclang-rt-dev  # libFuzzer: the fuzz targets of tests/host
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
 )
 

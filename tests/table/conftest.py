@@ -17,7 +17,6 @@
 # (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
 #
 import itertools
-import os
 import select
 import shutil
 import socket
