@@ -32,7 +32,7 @@ class Display:
                 try:
                     self.x, self.atom, self.root = connect(self.name)
                     break
-                except xerror.DisplayError:
+                except (xerror.DisplayError, OSError):  # not listening yet
                     time.sleep(0.1)
             if hasattr(self, "x"):
                 break
