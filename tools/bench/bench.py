@@ -34,10 +34,10 @@ def sh(*argv, **kw):
 def build(a):
     """The baselines, the stand-in application and the application folders, in build/bench."""
     b = a.work
+    os.makedirs(b, exist_ok=True)
     for name in ['map_watch', 'baseline_window', 'baseline_send']:
         sh('cc', '-O2', '-o', f'{b}/{name}', f'{HERE}/{name}.c', *(['-lX11'] if 'send' not in name else []))
     sh('cc', '-O2', '-shared', '-fPIC', '-o', f'{b}/vm_load_stamp.so', f'{HERE}/vm_load_stamp.c')
-    os.makedirs(b, exist_ok=True)
     sh(f'{JDK}/bin/javac', '--release', '17', '-d', f'{b}/classes', f'{HERE}/ApplicationMainForm.java')
     sh(f'{JDK}/bin/jar', '--create', '--file', f'{b}/bench.jar', '-C', f'{b}/classes', '.')
     jre = os.path.abspath(a.jre)
