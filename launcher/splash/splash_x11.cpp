@@ -54,8 +54,8 @@ int64_t NowMs() {
 
 void SetOpacity(Display* display, Window window, Atom opacity, int alpha) {
     unsigned long value = static_cast<unsigned long>(alpha) * 0x01010101ul;
-    XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(&value), 1);
+    Xlib.XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(&value), 1);
 }
 
 // The splash is drawn only on TrueColor screens with 8-bit red, green and blue in 32-bit pixels
@@ -82,9 +82,9 @@ XImage* MakeSplashImage(Display* display, const uint8_t* data, size_t size, cons
     if (depth == 32) {
         for (size_t i = 0; i < count; ++i) pixels[i] |= 0xFF000000u;  // opaque in an alpha visual
     }
-    XImage* image = XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0,
-                                 reinterpret_cast<char*>(pixels), static_cast<unsigned>(info.width),
-                                 static_cast<unsigned>(info.height), 32, 0);
+    XImage* image = Xlib.XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0,
+                                      reinterpret_cast<char*>(pixels), static_cast<unsigned>(info.width),
+                                      static_cast<unsigned>(info.height), 32, 0);
     if (image == nullptr || image->bits_per_pixel != 32) {
         if (image != nullptr) XDestroyImage(image);  // frees the pixels too
         else free(pixels);
@@ -117,9 +117,9 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
     XSetWindowAttributes attributes;
     attributes.background_pixel = BlackPixel(display, screen);
     attributes.event_mask = ExposureMask;
-    Window window = XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
-                                  static_cast<unsigned>(info.height), 0, CopyFromParent, InputOutput,
-                                  CopyFromParent, CWEventMask | (drawn ? 0 : CWBackPixel), &attributes);
+    Window window = Xlib.XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
+                                       static_cast<unsigned>(info.height), 0, CopyFromParent, InputOutput,
+                                       CopyFromParent, CWEventMask | (drawn ? 0 : CWBackPixel), &attributes);
 
     XSizeHints size;
     size.flags = USPosition | PPosition | PMinSize | PMaxSize;
@@ -127,29 +127,29 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
     size.y = y;
     size.min_width = size.max_width = info.width;
     size.min_height = size.max_height = info.height;
-    XSetWMNormalHints(display, window, &size);
+    Xlib.XSetWMNormalHints(display, window, &size);
     XWMHints hints;
     hints.flags = InputHint;
     hints.input = False;  // never takes the keyboard
-    XSetWMHints(display, window, &hints);
+    Xlib.XSetWMHints(display, window, &hints);
 
-    Atom atom = XInternAtom(display, "_NET_WM_WINDOW_TYPE_SPLASH", False);
-    XChangeProperty(display, window, XInternAtom(display, "_NET_WM_WINDOW_TYPE", False), XA_ATOM, 32,
-                    PropModeReplace, reinterpret_cast<unsigned char*>(&atom), 1);
-    Atom states[2] = {XInternAtom(display, "_NET_WM_STATE_SKIP_TASKBAR", False),
-                      XInternAtom(display, "_NET_WM_STATE_SKIP_PAGER", False)};
-    XChangeProperty(display, window, XInternAtom(display, "_NET_WM_STATE", False), XA_ATOM, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(states), 2);
+    Atom atom = Xlib.XInternAtom(display, "_NET_WM_WINDOW_TYPE_SPLASH", False);
+    Xlib.XChangeProperty(display, window, Xlib.XInternAtom(display, "_NET_WM_WINDOW_TYPE", False), XA_ATOM, 32,
+                         PropModeReplace, reinterpret_cast<unsigned char*>(&atom), 1);
+    Atom states[2] = {Xlib.XInternAtom(display, "_NET_WM_STATE_SKIP_TASKBAR", False),
+                      Xlib.XInternAtom(display, "_NET_WM_STATE_SKIP_PAGER", False)};
+    Xlib.XChangeProperty(display, window, Xlib.XInternAtom(display, "_NET_WM_STATE", False), XA_ATOM, 32,
+                         PropModeReplace, reinterpret_cast<unsigned char*>(states), 2);
     long motif[5] = {2, 0, 0, 0, 0};  // flags: decorations given; decorations: none
-    Atom motifAtom = XInternAtom(display, "_MOTIF_WM_HINTS", False);
-    XChangeProperty(display, window, motifAtom, motifAtom, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(motif), 5);
+    Atom motifAtom = Xlib.XInternAtom(display, "_MOTIF_WM_HINTS", False);
+    Xlib.XChangeProperty(display, window, motifAtom, motifAtom, 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(motif), 5);
     return window;
 }
 
 // Shows the window until its time is up, the wake-up pipe is written or the connection fails.
 void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity, int64_t closeAt) {
-    GC gc = XCreateGC(display, window, 0, nullptr);
+    GC gc = Xlib.XCreateGC(display, window, 0, nullptr);
     int64_t nextFade = NowMs() + kSplashFadeIntervalMs;
     bool fading = true;
     for (;;) {
@@ -161,23 +161,23 @@ void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity,
             else SetOpacity(display, window, opacity, alpha);
             nextFade = now + kSplashFadeIntervalMs;
         }
-        while (!XFailed() && XPending(display) > 0) {  // XPending also sends what is queued
+        while (!XFailed() && Xlib.XPending(display) > 0) {  // XPending also sends what is queued
             XEvent event;
-            XNextEvent(display, &event);
+            Xlib.XNextEvent(display, &event);
             if (event.type == Expose && image != nullptr) {
-                XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
-                          event.xexpose.y, static_cast<unsigned>(event.xexpose.width),
-                          static_cast<unsigned>(event.xexpose.height));
+                Xlib.XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
+                               event.xexpose.y, static_cast<unsigned>(event.xexpose.width),
+                               static_cast<unsigned>(event.xexpose.height));
             }
         }
-        XFlush(display);
+        Xlib.XFlush(display);
         if (XFailed()) break;
         int64_t wakeAt = fading && nextFade < closeAt ? nextFade : closeAt;
         pollfd fds[2] = {{ConnectionNumber(display), POLLIN, 0}, {gWakePipe[0], POLLIN, 0}};
         int timeout = static_cast<int>(wakeAt - NowMs());
         if (poll(fds, 2, timeout < 0 ? 0 : timeout) > 0 && fds[1].revents != 0) break;
     }
-    XFreeGC(display, gc);
+    Xlib.XFreeGC(display, gc);
 }
 
 // The splash thread's work from the picture to the destroyed window.
@@ -197,20 +197,20 @@ void ShowSplash(const SplashParams& params) {
 
     XImage* image = MakeSplashImage(display, data, size, info);
     Window window = CreateSplashWindow(display, params, info, image != nullptr);
-    Atom opacity = XInternAtom(display, "_NET_WM_WINDOW_OPACITY", False);
+    Atom opacity = Xlib.XInternAtom(display, "_NET_WM_WINDOW_OPACITY", False);
     SetOpacity(display, window, opacity, SplashFadeNext(&gFadeAlpha));  // 64 before it ever shows
-    XSync(display, False);
+    Xlib.XSync(display, False);
 
     // The display time counts from here, fade included.
     int64_t closeAt = NowMs() + params.displayMs;
     int expected = kPreparing;
     if (!XFailed() && gState.compare_exchange_strong(expected, kShowing)) {
-        XMapWindow(display, window);
+        Xlib.XMapWindow(display, window);
         RunSplashLoop(display, window, image, opacity, closeAt);
-        XUnmapWindow(display, window);
+        Xlib.XUnmapWindow(display, window);
     }
-    XDestroyWindow(display, window);
-    XSync(display, False);
+    Xlib.XDestroyWindow(display, window);
+    Xlib.XSync(display, False);
     if (image != nullptr) XDestroyImage(image);
     CloseXConnection(&gConnection);
 }
@@ -233,10 +233,9 @@ void JoinSplashThread() {
 
 void SplashStart(const SplashParams* params) {
     if (gState != 0) return;  // one splash per process
-    // Without a display there is nothing to show: no thread, no Xlib.
-    const char* display = getenv("DISPLAY");
-    if (display == nullptr || display[0] == 0) return;
-    XInitThreads();  // on the main thread, before the splash thread makes its first Xlib call
+    // Without a display there is nothing to show: no thread, no Xlib. libX11 is loaded here, on the
+    // main thread, rather than on the splash thread, where its loading could wait behind the VM's.
+    if (!LoadXlib()) return;
     if (pipe2(gWakePipe, O_CLOEXEC | O_NONBLOCK) != 0) return;
     gParams = *params;
     gState = kPreparing;
