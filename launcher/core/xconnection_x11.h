@@ -20,11 +20,12 @@
     X(XChangeProperty) X(XClearWindow) X(XCloseDisplay) X(XCreateGC) X(XCreateImage) X(XCreateWindow)   \
     X(XDestroyWindow) X(XDrawRectangle) X(XDrawString16) X(XFlush) X(XFree) X(XFreeFont) X(XFreeGC)     \
     X(XFreeStringList) X(XGetClassHint) X(XGetTextProperty) X(XGetWindowAttributes)                     \
-    X(XGetWindowProperty) X(XInitThreads) X(XInternAtom) X(XLoadQueryFont) X(XLookupKeysym)             \
-    X(XMapRaised) X(XMapWindow) X(XNextEvent) X(XOpenDisplay) X(XPending) X(XPutImage) X(XQueryTree)    \
-    X(XSendEvent) X(XSetClassHint) X(XSetErrorHandler) X(XSetFont) X(XSetForeground)                    \
-    X(XSetIOErrorExitHandler) X(XSetIOErrorHandler) X(XSetInputFocus) X(XSetWMHints)                    \
-    X(XSetWMNormalHints) X(XSetWMProtocols) X(XSync) X(XUnmapWindow) X(Xutf8TextPropertyToTextList)
+    X(XGetWindowProperty) X(XInitThreads) X(XInternAtom) X(XInternAtoms) X(XLoadQueryFont)              \
+    X(XLookupKeysym) X(XMapRaised) X(XMapWindow) X(XNextEvent) X(XOpenDisplay) X(XPending) X(XPutImage) \
+    X(XQueryTree) X(XSendEvent) X(XSetClassHint) X(XSetErrorHandler) X(XSetFont) X(XSetForeground)      \
+    X(XSetIOErrorExitHandler) X(XSetIOErrorHandler) X(XSetInputFocus) X(XSetWindowBackground)           \
+    X(XSetWMHints) X(XSetWMNormalHints) X(XSetWMProtocols) X(XSync) X(XUnmapWindow)                       \
+    X(Xutf8TextPropertyToTextList)
 
 struct XlibEntries {
 #define LAUNCHER_XLIB_MEMBER(name) decltype(&::name) name;
