@@ -41,20 +41,23 @@ SetLayeredWindowAttributesProc gSetLayeredWindowAttributes = nullptr;
 UINT_PTR gFadeTimer = 0;  // kept as returned, not used
 
 // DrawDib lives in msvfw32, which brings libraries of its own (under Wine winmm, msacm32, ole32,
-// combase and rpcrt4: about 30 ms of every start, before WinMain, measured). Only the splash draws
-// with it, so the splash thread loads it when it starts; a second instance or a "-noSplash" start
-// never does. Set once by the splash thread before its window exists; the library stays loaded.
+// combase and rpcrt4: WinMain came about 60 ms later, measured). Only the splash draws with it, so
+// SplashStart loads it, on the main thread before the splash thread exists: loaded on the splash
+// thread while the main thread loads the VM's library, the two loads could deadlock (seen under Wine,
+// a few starts in a hundred). A second instance or a "-noSplash" start never loads it. Written before
+// the splash thread starts, read-only afterwards; the library stays loaded.
+decltype(&DrawDibOpen) gDrawDibOpen = nullptr;
 decltype(&DrawDibDraw) gDrawDibDraw = nullptr;
 decltype(&DrawDibClose) gDrawDibClose = nullptr;
 
-// Loads msvfw32 and opens a DrawDib handle; null when either fails.
-HDRAWDIB OpenDrawDib() {
+void LoadDrawDib() {
     HMODULE library = LoadLibraryW(L"msvfw32");
-    if (library == nullptr) return nullptr;
-    auto open = reinterpret_cast<decltype(&DrawDibOpen)>(GetProcAddress(library, "DrawDibOpen"));
+    if (library == nullptr) return;
     gDrawDibDraw = reinterpret_cast<decltype(&DrawDibDraw)>(GetProcAddress(library, "DrawDibDraw"));
     gDrawDibClose = reinterpret_cast<decltype(&DrawDibClose)>(GetProcAddress(library, "DrawDibClose"));
-    return open != nullptr && gDrawDibDraw != nullptr && gDrawDibClose != nullptr ? open() : nullptr;
+    if (gDrawDibDraw != nullptr && gDrawDibClose != nullptr) {
+        gDrawDibOpen = reinterpret_cast<decltype(&DrawDibOpen)>(GetProcAddress(library, "DrawDibOpen"));
+    }
 }
 
 }  // namespace
@@ -152,7 +155,8 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
     // The window class, the window and the picture all belong to the launcher's own module.
     HINSTANCE instance = GetModuleHandleW(nullptr);
 
-    HDRAWDIB drawDib = OpenDrawDib();
+    // Without the library DrawDibOpen counts as failed.
+    HDRAWDIB drawDib = gDrawDibOpen != nullptr ? gDrawDibOpen() : nullptr;
     if (drawDib == nullptr) {
         GlobalFree(params);
         return 0;
@@ -238,6 +242,7 @@ void SplashStart(const SplashParams* params) {
     if (copy == nullptr) return;
     *copy = *params;
     bool wait = copy->waitForClose != 0;  // read before the copy belongs to the thread
+    if (gDrawDibOpen == nullptr) LoadDrawDib();
     HANDLE thread = CreateThread(nullptr, 0, SplashThreadProc, copy, 0, nullptr);
     if (thread == nullptr) {
         GlobalFree(copy);
