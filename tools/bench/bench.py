@@ -311,7 +311,12 @@ def machine():
 def document(a, R, text, missed, size_text):
     med = lambda v: f'{statistics.median(v):.1f}' if v else '?'
     notes = ''.join(f'- Not met in this run: {what}.\n' for key, what, *_ in FIGS if key in missed)
-    return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(
+    # $med_<figure>, $alt_<figure> (medians of the launcher and its alternative), $ratio_<figure>.
+    figures = {f'med_{key}': f'{statistics.median(R[key][0]):.2f}' if R[key][0] else '?' for key, *_ in FIGS}
+    figures.update({f'alt_{key}': f'{statistics.median(R[key][1]):.2f}' if R[key][1] else '?' for key, *_ in FIGS})
+    figures.update({f'ratio_{key}': f'{statistics.median([x / y for x, y in zip(*R[key])]):.2f}'
+                    if R[key][0] and R[key][1] else '?' for key, *_ in FIGS})
+    return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(figures,
         command=a.command, date=datetime.date.today(), pairs=a.pairs, machine=machine(), table=text,
         netns='a private network namespace' if os.environ.get('BENCH_NETNS') == 'private' else 'the shared network',
         picture=f'{os.path.getsize(a.bmp):,}', sizes=size_text, java=' '.join(a.java), vm_launcher=med(a.vm_part[0]),
