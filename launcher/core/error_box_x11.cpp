@@ -72,15 +72,15 @@ void DrawText16(Display* display, Window window, GC gc, XFontStruct* font, int x
         glyphs[i].byte1 = static_cast<unsigned char>(c >> 8);
         glyphs[i].byte2 = static_cast<unsigned char>(c & 0xFF);
     }
-    XDrawString16(display, window, gc, x, y, glyphs, units);
+    Xlib.XDrawString16(display, window, gc, x, y, glyphs, units);
 }
 
-Atom Intern(Display* display, const char* name) { return XInternAtom(display, name, False); }
+Atom Intern(Display* display, const char* name) { return Xlib.XInternAtom(display, name, False); }
 
 void SetAtomProperty(Display* display, Window window, const char* name, const char* value) {
     Atom atom = Intern(display, value);
-    XChangeProperty(display, window, Intern(display, name), XA_ATOM, 32, PropModeAppend,
-                    reinterpret_cast<unsigned char*>(&atom), 1);
+    Xlib.XChangeProperty(display, window, Intern(display, name), XA_ATOM, 32, PropModeAppend,
+                         reinterpret_cast<unsigned char*>(&atom), 1);
 }
 
 // The dialog from creation to dismissal; true when it was shown.
@@ -102,20 +102,21 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
     XSetWindowAttributes attributes;
     attributes.background_pixel = WhitePixel(display, screen);
     attributes.event_mask = ExposureMask | KeyPressMask | ButtonPressMask | ButtonReleaseMask | StructureNotifyMask;
-    Window window = XCreateWindow(display, root, x, y, static_cast<unsigned>(width), static_cast<unsigned>(height), 0,
-                                  CopyFromParent, InputOutput, CopyFromParent, CWBackPixel | CWEventMask, &attributes);
+    Window window = Xlib.XCreateWindow(display, root, x, y, static_cast<unsigned>(width), static_cast<unsigned>(height),
+                                       0, CopyFromParent, InputOutput, CopyFromParent, CWBackPixel | CWEventMask,
+                                       &attributes);
 
     // Title (UTF-8 in both name properties), class, fixed size and centred place, focus and close.
     Atom utf8 = Intern(display, "UTF8_STRING");
     int captionBytes = static_cast<int>(strlen(caption));
     const unsigned char* captionData = reinterpret_cast<const unsigned char*>(caption);
-    XChangeProperty(display, window, XA_WM_NAME, utf8, 8, PropModeReplace, captionData, captionBytes);
-    XChangeProperty(display, window, Intern(display, "_NET_WM_NAME"), utf8, 8, PropModeReplace, captionData,
-                    captionBytes);
+    Xlib.XChangeProperty(display, window, XA_WM_NAME, utf8, 8, PropModeReplace, captionData, captionBytes);
+    Xlib.XChangeProperty(display, window, Intern(display, "_NET_WM_NAME"), utf8, 8, PropModeReplace, captionData,
+                         captionBytes);
     // Not a frame class, so a second instance's activation never picks the dialog.
     char className[] = "QZ-Lumiscope_QZ-57";
     XClassHint classHint = {className, className};
-    XSetClassHint(display, window, &classHint);
+    Xlib.XSetClassHint(display, window, &classHint);
     XSizeHints size;
     size.flags = USPosition | PPosition | PMinSize | PMaxSize | PWinGravity;
     size.x = x;
@@ -123,26 +124,26 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
     size.min_width = size.max_width = width;
     size.min_height = size.max_height = height;
     size.win_gravity = CenterGravity;  // the frame is centred, not just the client area
-    XSetWMNormalHints(display, window, &size);
+    Xlib.XSetWMNormalHints(display, window, &size);
     XWMHints wmHints;
     wmHints.flags = InputHint;
     wmHints.input = True;
-    XSetWMHints(display, window, &wmHints);
+    Xlib.XSetWMHints(display, window, &wmHints);
     Atom closeProtocol = Intern(display, "WM_DELETE_WINDOW");
-    XSetWMProtocols(display, window, &closeProtocol, 1);
+    Xlib.XSetWMProtocols(display, window, &closeProtocol, 1);
     SetAtomProperty(display, window, "_NET_WM_WINDOW_TYPE", "_NET_WM_WINDOW_TYPE_DIALOG");
     SetAtomProperty(display, window, "_NET_WM_STATE", "_NET_WM_STATE_ABOVE");  // on top, as the Windows box
-    GC gc = XCreateGC(display, window, 0, nullptr);
-    XSetFont(display, gc, font->fid);
-    XMapRaised(display, window);
-    XSync(display, False);
+    GC gc = Xlib.XCreateGC(display, window, 0, nullptr);
+    Xlib.XSetFont(display, gc, font->fid);
+    Xlib.XMapRaised(display, window);
+    Xlib.XSync(display, False);
     bool shown = false;
     bool done = gConnection.failed || gConnection.lost;  // the window could not be made
     bool pressedOnButton = false;
     while (!done) {
-        while (!done && !gConnection.lost && XPending(display) > 0) {
+        while (!done && !gConnection.lost && Xlib.XPending(display) > 0) {
             XEvent event;
-            XNextEvent(display, &event);
+            Xlib.XNextEvent(display, &event);
             if (event.type == MapNotify && !shown) {
                 shown = true;
                 // Ask the window manager for the focus, as a pager would, and take it where there is none.
@@ -152,21 +153,21 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
                 active.xclient.message_type = Intern(display, "_NET_ACTIVE_WINDOW");
                 active.xclient.format = 32;
                 active.xclient.data.l[0] = 2;
-                XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &active);
-                XSetInputFocus(display, window, RevertToParent, CurrentTime);
+                Xlib.XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &active);
+                Xlib.XSetInputFocus(display, window, RevertToParent, CurrentTime);
             } else if (event.type == Expose && event.xexpose.count == 0) {
-                XClearWindow(display, window);
-                XSetForeground(display, gc, BlackPixel(display, screen));
+                Xlib.XClearWindow(display, window);
+                Xlib.XSetForeground(display, gc, BlackPixel(display, screen));
                 for (int i = 0; i < lineCount; ++i) {
                     DrawText16(display, window, gc, font, kMargin, kMargin + i * lineHeight + font->ascent,
                                lines[i].start, lines[i].units);
                 }
-                XDrawRectangle(display, window, gc, button.x, button.y, button.width - 1, button.height - 1);
+                Xlib.XDrawRectangle(display, window, gc, button.x, button.y, button.width - 1, button.height - 1);
                 static const char16_t kOk[] = u"OK";
                 DrawText16(display, window, gc, font, button.x + (button.width - 2 * font->max_bounds.width) / 2,
                            button.y + (button.height + font->ascent - font->descent) / 2, kOk, 2);
             } else if (event.type == KeyPress && !event.xkey.send_event) {
-                KeySym key = XLookupKeysym(&event.xkey, 0);
+                KeySym key = Xlib.XLookupKeysym(&event.xkey, 0);
                 done = key == XK_Return || key == XK_KP_Enter || key == XK_Escape;
             } else if ((event.type == ButtonPress || event.type == ButtonRelease) && event.xbutton.button == Button1) {
                 bool onButton = event.xbutton.x >= button.x && event.xbutton.x < button.x + button.width &&
@@ -181,14 +182,14 @@ bool RunDialog(Display* display, XFontStruct* font, const char* caption, const D
             }
         }
         if (gConnection.lost) break;
-        XFlush(display);
+        Xlib.XFlush(display);
         pollfd fd = {ConnectionNumber(display), POLLIN, 0};
         if (!done) poll(&fd, 1, -1);
     }
     if (!gConnection.lost) {
-        XFreeGC(display, gc);
-        XDestroyWindow(display, window);
-        XSync(display, False);
+        Xlib.XFreeGC(display, gc);
+        Xlib.XDestroyWindow(display, window);
+        Xlib.XSync(display, False);
     }
     return shown;
 }
@@ -200,8 +201,8 @@ bool ShowErrorDialog(const char* caption, const char* text) {
     Display* display = gConnection.display;
 
     // A Unicode face of the core "fixed" font where the server has one, else "fixed" itself.
-    XFontStruct* font = XLoadQueryFont(display, "-misc-fixed-medium-r-semicondensed--13-*-*-*-*-*-iso10646-1");
-    if (font == nullptr) font = XLoadQueryFont(display, "fixed");
+    XFontStruct* font = Xlib.XLoadQueryFont(display, "-misc-fixed-medium-r-semicondensed--13-*-*-*-*-*-iso10646-1");
+    if (font == nullptr) font = Xlib.XLoadQueryFont(display, "fixed");
     char16_t* wide = WidenText(text != nullptr ? text : "");
     bool shown = false;
     if (font != nullptr && wide != nullptr) {
@@ -209,7 +210,7 @@ bool ShowErrorDialog(const char* caption, const char* text) {
         shown = RunDialog(display, font, caption != nullptr ? caption : "Error", lines, WrapText(wide, lines));
     }
     free(wide);
-    if (font != nullptr && !gConnection.lost) XFreeFont(display, font);
+    if (font != nullptr && !gConnection.lost) Xlib.XFreeFont(display, font);
     CloseXConnection(&gConnection);
     return shown;
 }

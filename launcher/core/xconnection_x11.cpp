@@ -1,9 +1,33 @@
 // The launcher's own Xlib connections and the process-wide handlers that keep their errors quiet.
 #include "xconnection_x11.h"
 
+#include <dlfcn.h>
+#include <pthread.h>
+#include <stdlib.h>
+
 #include <atomic>
 
+XlibEntries Xlib;
+
 namespace {
+
+pthread_once_t xlibOnce = PTHREAD_ONCE_INIT;
+bool xlibLoaded = false;
+
+// The library stays loaded for the life of the process (the Java toolkit may load it too).
+void ResolveXlib() {
+    const char* display = getenv("DISPLAY");
+    if (display == nullptr || display[0] == 0) return;
+    void* library = dlopen("libX11.so.6", RTLD_NOW | RTLD_LOCAL);
+    if (library == nullptr) return;
+#define LAUNCHER_XLIB_RESOLVE(name)                                                    \
+    Xlib.name = reinterpret_cast<decltype(Xlib.name)>(dlsym(library, #name));          \
+    if (Xlib.name == nullptr) return;
+    LAUNCHER_XLIB_ENTRIES(LAUNCHER_XLIB_RESOLVE)
+#undef LAUNCHER_XLIB_RESOLVE
+    Xlib.XInitThreads();  // before any other Xlib call: the splash thread and the main thread both use Xlib
+    xlibLoaded = true;
+}
 
 // At most one connection per user at a time: the splash, the window search and the dialog.
 const int kSlots = 4;
@@ -40,26 +64,32 @@ void RecordIoError(Display*, void* connection) { static_cast<XConnection*>(conne
 
 }  // namespace
 
+bool LoadXlib() {
+    pthread_once(&xlibOnce, ResolveXlib);
+    return xlibLoaded;
+}
+
 bool OpenXConnection(XConnection* connection) {
-    XInitThreads();  // before any other Xlib call: the splash thread and the main thread both use Xlib
     connection->failed = connection->lost = false;
-    connection->display = XOpenDisplay(nullptr);
+    connection->display = nullptr;
+    if (!LoadXlib()) return false;
+    connection->display = Xlib.XOpenDisplay(nullptr);
     if (connection->display == nullptr) return false;
     for (std::atomic<XConnection*>& slot : connections) {
         XConnection* empty = nullptr;
         if (slot.compare_exchange_strong(empty, connection)) break;
     }
-    XSetIOErrorExitHandler(connection->display, RecordIoError, connection);
-    XErrorHandler previous = XSetErrorHandler(RecordXError);
+    Xlib.XSetIOErrorExitHandler(connection->display, RecordIoError, connection);
+    XErrorHandler previous = Xlib.XSetErrorHandler(RecordXError);
     if (previous != RecordXError) previousErrorHandler = previous;
-    XIOErrorHandler previousIo = XSetIOErrorHandler(QuietIoError);
+    XIOErrorHandler previousIo = Xlib.XSetIOErrorHandler(QuietIoError);
     if (previousIo != QuietIoError) previousIoHandler = previousIo;
     return true;
 }
 
 void CloseXConnection(XConnection* connection) {
     if (connection->display == nullptr) return;
-    XCloseDisplay(connection->display);
+    Xlib.XCloseDisplay(connection->display);
     for (std::atomic<XConnection*>& slot : connections) {
         XConnection* self = connection;
         slot.compare_exchange_strong(self, nullptr);

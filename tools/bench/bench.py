@@ -34,10 +34,10 @@ def sh(*argv, **kw):
 def build(a):
     """The baselines, the stand-in application and the application folders, in build/bench."""
     b = a.work
+    os.makedirs(b, exist_ok=True)
     for name in ['map_watch', 'baseline_window', 'baseline_send']:
         sh('cc', '-O2', '-o', f'{b}/{name}', f'{HERE}/{name}.c', *(['-lX11'] if 'send' not in name else []))
     sh('cc', '-O2', '-shared', '-fPIC', '-o', f'{b}/vm_load_stamp.so', f'{HERE}/vm_load_stamp.c')
-    os.makedirs(b, exist_ok=True)
     sh(f'{JDK}/bin/javac', '--release', '17', '-d', f'{b}/classes', f'{HERE}/ApplicationMainForm.java')
     sh(f'{JDK}/bin/jar', '--create', '--file', f'{b}/bench.jar', '-C', f'{b}/classes', '.')
     jre = os.path.abspath(a.jre)
@@ -311,7 +311,12 @@ def machine():
 def document(a, R, text, missed, size_text):
     med = lambda v: f'{statistics.median(v):.1f}' if v else '?'
     notes = ''.join(f'- Not met in this run: {what}.\n' for key, what, *_ in FIGS if key in missed)
-    return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(
+    # $med_<figure>, $alt_<figure> (medians of the launcher and its alternative), $ratio_<figure>.
+    figures = {f'med_{key}': f'{statistics.median(R[key][0]):.2f}' if R[key][0] else '?' for key, *_ in FIGS}
+    figures.update({f'alt_{key}': f'{statistics.median(R[key][1]):.2f}' if R[key][1] else '?' for key, *_ in FIGS})
+    figures.update({f'ratio_{key}': f'{statistics.median([x / y for x, y in zip(*R[key])]):.2f}'
+                    if R[key][0] and R[key][1] else '?' for key, *_ in FIGS})
+    return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(figures,
         command=a.command, date=datetime.date.today(), pairs=a.pairs, machine=machine(), table=text,
         netns='a private network namespace' if os.environ.get('BENCH_NETNS') == 'private' else 'the shared network',
         picture=f'{os.path.getsize(a.bmp):,}', sizes=size_text, java=' '.join(a.java), vm_launcher=med(a.vm_part[0]),
