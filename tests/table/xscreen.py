@@ -41,10 +41,17 @@ class Display:
             raise RuntimeError("Xvfb did not start")
         env = {**os.environ, "DISPLAY": self.name}
         self.procs += [subprocess.Popen(p, env=env, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL) for p in (["openbox"], ["xcompmgr"])]
-        for _ in range(100):  # the window manager announces itself on the root window
-            if self.root.get_full_property(self.atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType):
+        # The window manager is ready once it has mapped a window of ours: one that announces itself
+        # but is still starting up can drop a map request, and a splash would then never show.
+        probe = self.root.create_window(0, 0, 10, 10, 0, X.CopyFromParent)
+        probe.map()
+        for _ in range(200):
+            if self.root.get_full_property(self.atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType) and \
+                    probe.get_attributes().map_state == X.IsViewable and probe.query_tree().parent != self.root:
                 break
             time.sleep(0.05)
+        probe.destroy()
+        self.x.sync()
 
     def ask_wm(self, window, message, *data):
         # A client message to the window manager about `window`, as pagers and taskbars send them.
