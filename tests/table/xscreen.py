@@ -21,22 +21,26 @@ def connect(name):
 
 class Display:
     def __init__(self):
-        for _ in range(3):  # an X server that gives up at start (seen rarely) is started again
-            read, write = os.pipe()  # Xvfb picks a free display and writes its number there
-            self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
-                                           pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
-            os.close(write)
-            self.name = ":" + os.read(read, 16).decode().strip()
-            os.close(read)
-            for _ in range(100 * (self.name != ":")):
-                try:
-                    self.x, self.atom, self.root = connect(self.name)
-                    break
-                except (xerror.DisplayError, OSError):  # not listening yet
-                    time.sleep(0.1)
-            if hasattr(self, "x"):
+        for _ in range(3):  # a server that gives up, or drops our connection, at start (seen rarely) is started again
+            try:
+                return self.start()
+            except (xerror.DisplayError, xerror.ConnectionClosedError, OSError, RuntimeError):
+                self.close()
+        raise RuntimeError("Xvfb and its window manager did not start")
+
+    def start(self):
+        read, write = os.pipe()  # Xvfb picks a free display and writes its number there
+        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
+                                       pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
+        os.close(write)
+        self.name = ":" + os.read(read, 16).decode().strip()
+        os.close(read)
+        for _ in range(100 * (self.name != ":")):
+            try:
+                self.x, self.atom, self.root = connect(self.name)
                 break
-            self.procs[0].kill()
+            except (xerror.DisplayError, OSError):  # not listening yet
+                time.sleep(0.1)
         else:
             raise RuntimeError("Xvfb did not start")
         env = {**os.environ, "DISPLAY": self.name}
@@ -50,6 +54,8 @@ class Display:
                     probe.get_attributes().map_state == X.IsViewable and probe.query_tree().parent != self.root:
                 break
             time.sleep(0.05)
+        else:
+            raise RuntimeError("the window manager did not start")
         probe.destroy()
         self.x.sync()
 
