@@ -125,7 +125,9 @@ class Running(conftest.Running):
             self.held.close()
         if self.listener:
             self.listener.finish()
-        stdout, stderr = (f.seek(0) or f.read().decode("utf-8", "replace") for f in self.output)
+        for file in self.output:
+            file.seek(0)
+        stdout, stderr = (file.read().decode("utf-8", "replace") for file in self.output)
         # A parent sees the low 8 bits of the exit status; the whole result stands on standard error.
         code, boxes = self.process.returncode, []
         for line in stderr.splitlines():

@@ -64,7 +64,7 @@ class Platform(conftest.Platform):
     def start(self, app, args=(), argv0=None, cwd=None, lock=False, listener=None, folders=None, windows=(),
               debug=False, splash=False, log="junk", timeout=120):
         self.reset_log(log)
-        output = Path(tempfile.mktemp(prefix="probe-out.", dir=self.state))
+        output = app.path / "output.txt"  # the program's standard output and error, written by probe.exe
         probe = [self.env["WINE"], str(self.build / "tests/wine/probe.exe"), "exe=" + hexunits(app.exe), f"timeout={timeout * 1000}",
                  "cmd=" + hexunits(subprocess.list2cmdline([argv0 or app.exe, *args])), "out=" + hexunits(win(output)),
                  "cwd=" + hexunits(app.native if cwd == "app" else "C:\\windows")]
@@ -103,12 +103,10 @@ class Running(conftest.Running):
             events.setdefault(kind, []).append([text(f) if f.startswith("t") else int(f) for f in fields])
         (t, code, killed), = events["exit"]
         seen, gone = events.get("splash"), events.get("splash_gone")
-        out = SimpleNamespace(
+        return SimpleNamespace(
             code=code, killed=bool(killed), elapsed=t, stdout=self.output.read_bytes().decode("latin-1"), screen=tuple(events["screen"][0]),
             boxes=[SimpleNamespace(t=b[0], caption=b[1], text=b[2], icon=bool(b[3]), splash=bool(b[4])) for b in events.get("box", [])],
             windows=[dict(zip(("pos", "iconic", "zoomed", "visible", "front"), map(bool, w))) | {"pos": w[0]} for w in events.get("window", [])],
             splash=seen and {"t": seen[0][0], "rect": seen[0][1:5], "exstyle": seen[0][5], "gone": gone[0][0], "alphas": gone[0][1:]},
             record=self.app.record(), log=self.wine.read_log(), log_folder=self.wine.log_folder(), listener=self.listener,
             received=self.listener and self.listener.received)
-        self.output.unlink()
-        return out
