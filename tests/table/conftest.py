@@ -11,13 +11,11 @@
 #
 # vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
 # missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
-# exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw, listen, child, frame.
+# exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw=1.
 # vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
 # JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
 # (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
-#
 import itertools
-import select
 import shutil
 import socket
 import struct
@@ -25,6 +23,7 @@ import subprocess
 import threading
 import time
 from pathlib import Path
+from types import SimpleNamespace
 
 import pytest
 
@@ -48,34 +47,36 @@ class App:
         return Record(file.read_bytes()) if file.exists() else None
 
 
-class Listener:  # the running application's end of the hand-off: keeps what arrives until the sender
-    # closes, or resets the connection after `drop_after` bytes; counts connections
+class Listener(threading.Thread):  # the running application's end of the hand-off: keeps what arrives
+    # until the sender closes, or resets the connection after `drop_after` bytes; counts connections
     def __init__(self, drop_after=None):
+        super().__init__(daemon=True)
         self.drop_after, self.received, self.connections, self.closed_by_sender = drop_after, b"", 0, False
-
-    def start(self):
         self.sock = port_free()
         self.sock.listen(4)
-        self.thread = threading.Thread(target=self._serve, daemon=True)
-        self.thread.start()
+        self.sock.settimeout(60)
 
-    def _serve(self):
-        if select.select([self.sock], [], [], 60)[0]:
+    def run(self):
+        try:
             conn, self.connections = self.sock.accept()[0], 1
-            conn.settimeout(30)
-            while self.drop_after is None or len(self.received) < self.drop_after:
-                chunk = conn.recv(65536 if self.drop_after is None else self.drop_after - len(self.received))
-                self.closed_by_sender = not chunk
-                if not chunk:
-                    break
-                self.received += chunk
-            if self.drop_after:
-                conn.setsockopt(socket.SOL_SOCKET, socket.SO_LINGER, struct.pack("ii", 1, 0))
-            conn.close()
+        except OSError:
+            return  # nobody came: the row's check says so
+        conn.settimeout(30)
+        room = lambda: 1 << 16 if self.drop_after is None else self.drop_after - len(self.received)
+        while not self.closed_by_sender and room() > 0:
+            chunk = conn.recv(room())
+            self.received, self.closed_by_sender = self.received + chunk, not chunk
+        if self.drop_after:
+            conn.setsockopt(socket.SOL_SOCKET, socket.SO_LINGER, struct.pack("ii", 1, 0))
+        conn.close()
 
     def finish(self):
-        self.thread.join(60)
-        self.connections += len(select.select([self.sock], [], [], 0.2)[0])
+        self.join(60)
+        self.sock.settimeout(0.2)
+        try:
+            self.connections += bool(self.sock.accept())
+        except OSError:
+            pass
         self.sock.close()
 
 
@@ -84,8 +85,7 @@ def port_free():  # bound to the hand-off port, or the row fails: rows must not 
     sock.setsockopt(socket.SOL_SOCKET, socket.SO_REUSEADDR, 1)
     for _ in range(50):
         try:
-            sock.bind(("127.0.0.1", PORT))
-            return sock
+            return sock.bind(("127.0.0.1", PORT)) or sock
         except OSError:
             time.sleep(0.2)
     pytest.fail(f"port {PORT} is taken by another program")
@@ -119,16 +119,15 @@ class Platform:
         elif how == "nofolder":
             shutil.rmtree(folder, ignore_errors=True)
 
-    def log_folder(self):
-        return (self.docs / LOG).parent.exists()
-
     def run(self, app, args=(), **inputs):
         return self.start(app, args, **inputs).finish()
 
 
 class Running:
-    def __init__(self, app, process):
-        self.app, self.process = app, process
+    def __init__(self, platform, app, process, listener, timeout):
+        self.platform, self.app, self.process, self.listener, self.timeout = platform, app, process, listener, timeout
+        if listener:
+            listener.start()
 
     def wait_main(self):
         for _ in range(600):
@@ -140,6 +139,12 @@ class Running:
     def stop(self):
         (self.app.path / "stop").write_bytes(b"")
         return self.finish()
+
+    def outcome(self, **seen):  # what both platforms report alike, with what only the platform saw
+        if self.listener:
+            self.listener.finish()
+        return SimpleNamespace(**seen, record=self.app.record(), log=self.platform.read_log(), listener=self.listener,
+                               log_folder=(self.platform.docs / LOG).parent.exists(), received=self.listener and self.listener.received)
 
 
 def pytest_addoption(parser):

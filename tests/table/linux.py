@@ -15,38 +15,27 @@ import conftest
 from xscreen import Display, Watcher
 
 ROOT = Path(__file__).resolve().parents[2]
-EXE = "QZ-Lumiscope_QZ-57"
+EXE, CAPTIONS = "QZ-Lumiscope_QZ-57", ("QZ-Lumiscope QZ-57", "Error")
 JDK = Path("/usr/lib/jvm/java-17-openjdk-amd64/bin")
 LOCK_NAME = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735.lock"
-CAPTION = "QZ-Lumiscope QZ-57"
-
-
-class App(conftest.App):
-    def record(self):  # the VM keeps the class path out of its input arguments; its property has it
-        record = super().record()
-        if record:
-            record.options[:0] = [f"-Djava.class.path={line[25:]}" for line in record.lines if line.startswith("property java.class.path ")]
-        return record
 
 
 class Platform(conftest.Platform):
-    write_failed = "WriteFile failed with error 9.\n"
+    write_failed, raised = "WriteFile failed with error 9.\n", 3  # the Java toolkit's frame class counts here
 
     def __init__(self, arch, build):
-        self.build = (ROOT / build / "linux").resolve()
-        self.state = Path(tempfile.mkdtemp(prefix="qz57-table."))
+        self.build, self.state = (ROOT / build / "linux").resolve(), Path(tempfile.mkdtemp(prefix="qz57-table."))
         self.home, self.run_dir = self.state / "home", self.state / "run"
         super().__init__(f"linux-{arch}", self.state / "apps", self.home / "Documents", "/")
         subprocess.run(["bash", ROOT / "tools/make-jre.sh", self.build / "table"], check=True, capture_output=True)
-        nomain = self.state / "nomain/com/qz/kpo/emu57/app"
-        nomain.mkdir(parents=True)
-        (nomain / "ApplicationMainForm.java").write_text("package com.qz.kpo.emu57.app;\npublic class ApplicationMainForm {}\n")
+        nomain = self.state / "nomain/com/qz/kpo/emu57/app/ApplicationMainForm.java"  # a main class without main
+        nomain.parent.mkdir(parents=True)
+        nomain.write_text("package com.qz.kpo.emu57.app;\npublic class ApplicationMainForm {}\n")
         for name, sources in (("emu57.jar", ROOT / "tests/app"), ("nomain.jar", self.state / "nomain")):
-            files = [str(f) for f in Path(sources).rglob("*.java")]
-            subprocess.run([JDK / "javac", "--release", "17", "-encoding", "UTF-8", "-d", self.state / name / "classes", *files], check=True)
-            subprocess.run([JDK / "jar", "cf", self.state / name / name, "-C", self.state / name / "classes", "."], check=True)
+            subprocess.run([JDK / "javac", "--release", "17", "-d", self.state / name / "c", *Path(sources).rglob("*.java")], check=True)
+            subprocess.run([JDK / "jar", "cf", self.state / name / name, "-C", self.state / name / "c", "."], check=True)
         (self.state / "noentry").mkdir()
-        subprocess.run(["cc", "-shared", "-fPIC", "-x", "c", "-", "-o", self.state / "noentry/libjvm.so"], input=b"int nothing(void) { return 0; }\n", check=True)
+        subprocess.run(["cc", "-shared", "-x", "c", "-", "-o", self.state / "noentry/libjvm.so"], input=b"int nothing;\n", check=True)
         self.run_dir.mkdir(mode=0o700)
         (self.home / ".config").mkdir(parents=True)
         self.display, self.picture, self.screen = Display(), (480, 300), (1280, 1024)
@@ -74,9 +63,8 @@ class Platform(conftest.Platform):
         if runtime == "double":
             (path / "jre").symlink_to(self.build / "table/jre")
         elif runtime == "noentry":
-            (path / "jre/lib/server").mkdir(parents=True)
-            shutil.copy(self.state / "noentry/libjvm.so", path / "jre/lib/server")
-        return App(path, str(path), str(path / EXE))
+            shutil.copytree(self.state / "noentry", path / "jre/lib/server")
+        return conftest.App(path, str(path), str(path / EXE))
 
     def start(self, app, args=(), argv0=None, cwd=None, lock=False, listener=None, folders=None, windows=(),
               debug=False, splash=False, log="junk", display=True, timeout=120):
@@ -84,66 +72,52 @@ class Platform(conftest.Platform):
         env = {"PATH": os.environ["PATH"], "HOME": str(self.home), "XDG_RUNTIME_DIR": str(self.run_dir), "LANG": "C.UTF-8",
                **({"DISPLAY": self.display.name} if display else {})}
         env.update({name: value or str(self.state / "missing") for name, value in (folders or {}).items()})
-        command = [a if isinstance(a, bytes) else a.encode() for a in args]
-        program = app.exe
+        command = [app.exe, *(a if isinstance(a, bytes) else a.encode() for a in args)]
         if argv0 == "bare":  # started through PATH by its bare name
-            env["PATH"], program = f"{app.path}:{env['PATH']}", EXE
-        if debug:
-            command, program = [b"-f", b"-o", b"/dev/null", program.encode(), *command], "strace"
+            env["PATH"], command[0] = f"{app.path}:{env['PATH']}", EXE
         held = open(self.run_dir / LOCK_NAME, "w") if lock else None
         if held:
             fcntl.flock(held, fcntl.LOCK_EX)
-        if listener:
-            listener.start()
-        output = tempfile.TemporaryFile(), tempfile.TemporaryFile()
-        started = time.monotonic()
-        watcher = Watcher(self.display.name, started) if display else None
-        made = self.display.make_windows(windows) if windows else []
-        process = subprocess.Popen([program, *command], stdout=output[0], stderr=output[1], stdin=subprocess.DEVNULL,
-                                   cwd=app.path if cwd == "app" else "/", env=env)
-        return Running(self, app, process, output, listener, held, started, timeout, watcher, made)
+        output, started = tempfile.TemporaryFile(), time.monotonic()
+        watcher, made = display and Watcher(self.display.name, started), self.display.make_windows(windows)
+        process = subprocess.Popen(["strace", "-f", "-o", "/dev/null"] * debug + command, stdout=output, stderr=subprocess.PIPE,
+                                   stdin=subprocess.DEVNULL, cwd=app.path if cwd == "app" else "/", env=env)
+        return Running(self, app, process, listener, timeout, SimpleNamespace(output=output, held=held, started=started,
+                                                                               watcher=watcher, made=made))
 
 
 class Running(conftest.Running):
-    def __init__(self, linux, app, process, output, listener, held, started, timeout, watcher, made):
-        super().__init__(app, process)
-        self.linux, self.output, self.listener, self.held, self.started, self.timeout, self.watcher, self.made = \
-            linux, output, listener, held, started, timeout, watcher, made
+    def __init__(self, platform, app, process, listener, timeout, run):
+        super().__init__(platform, app, process, listener, timeout)
+        self.run = run
 
     def finish(self):
         try:
-            self.process.wait(self.timeout)
+            stderr = self.process.communicate(timeout=self.timeout)[1].decode("utf-8", "replace")
         except subprocess.TimeoutExpired:
             self.process.kill()
-            self.process.wait()
-        elapsed = (time.monotonic() - self.started) * 1000
-        splash, dialogs = self.watcher.finish() if self.watcher else (None, [])
-        windows = self.linux.display.window_states(self.made) if self.made else []
-        for window in self.made:
+            stderr = self.process.communicate()[1].decode("utf-8", "replace")
+        run, elapsed = self.run, (time.monotonic() - self.run.started) * 1000
+        splash, dialogs = run.watcher.finish() if run.watcher else (None, [])
+        windows = self.platform.display.window_states(run.made)
+        for window in run.made:
             window.destroy()
-        if self.held:
-            self.held.close()
-        if self.listener:
-            self.listener.finish()
-        for file in self.output:
-            file.seek(0)
-        stdout, stderr = (file.read().decode("utf-8", "replace") for file in self.output)
+        if run.held:
+            run.held.close()
+        run.output.seek(0)
         # A parent sees the low 8 bits of the exit status; the whole result stands on standard error.
         code, boxes = self.process.returncode, []
-        for line in stderr.splitlines():
-            caption, _, text = line.partition(": ")
-            if caption in (CAPTION, "Error") and text.startswith("launch ended with result "):
+        for caption, _, text in (line.partition(": ") for line in stderr.splitlines()):
+            if caption in CAPTIONS and text.startswith("launch ended with result "):
                 assert int(text.split()[-1]) & 0xFF == code & 0xFF
                 code = int(text.split()[-1])
-            elif caption in (CAPTION, "Error"):
+            elif caption in CAPTIONS:
                 boxes.append(SimpleNamespace(caption=caption, text=text, icon=True, splash=False, t=elapsed))
         # With a display every box is also a dialog, in the same order: whether it took the focus and
         # the splash was still up come from the screen.
-        if self.watcher:
-            assert [d["caption"] for d in dialogs] == [b.caption for b in boxes], (dialogs, boxes)
-            assert all(d["focus"] for d in dialogs), "a dialog did not take the keyboard focus"
+        if run.watcher:
+            assert [d["caption"] for d in dialogs] == [b.caption for b in boxes] and all(d["focus"] for d in dialogs), (dialogs, boxes)
             for box, dialog in zip(boxes, dialogs):
                 box.splash, box.t = dialog["splash"], dialog["t"]
-        return SimpleNamespace(code=code, killed=self.process.returncode == -9, elapsed=elapsed, stdout=stdout, boxes=boxes, splash=splash,
-                               screen=self.linux.screen, windows=windows, record=self.app.record(), log=self.linux.read_log(),
-                               log_folder=self.linux.log_folder(), listener=self.listener, received=self.listener and self.listener.received)
+        return self.outcome(code=code, killed=self.process.returncode == -9, elapsed=elapsed, stdout=run.output.read().decode(),
+                            boxes=boxes, splash=splash, screen=self.platform.screen, windows=windows)

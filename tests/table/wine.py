@@ -23,7 +23,7 @@ def win(path):
 
 
 class Platform(conftest.Platform):
-    write_failed = "WriteFile failed with error 6.\r\n"
+    write_failed, raised = "WriteFile failed with error 6.\r\n", 2
 
     def __init__(self, arch, build):
         self.build = (ROOT / build / arch).resolve()
@@ -74,12 +74,10 @@ class Platform(conftest.Platform):
                 (self.drive_c / path[3:].replace("\\", "/")).mkdir(parents=True, exist_ok=True)
             probe.append("folder=" + hexunits(f"{name}={path or UNUSABLE}"))
         probe += ["window=" + hexunits(",".join(w)) for w in windows]
-        if listener:
-            listener.start()
         # Events go to a file: Wine's own processes, started on the program's behalf, would hold a pipe open.
         events = tempfile.TemporaryFile()
         process = subprocess.Popen(probe, stdout=events, stderr=subprocess.DEVNULL, stdin=subprocess.DEVNULL, env=self.env)
-        return Running(self, app, process, (events, output), listener, timeout)
+        return Running(self, app, process, listener, timeout, events, output)
 
 
 def text(token):
@@ -87,26 +85,20 @@ def text(token):
 
 
 class Running(conftest.Running):
-    def __init__(self, wine, app, process, output, listener, timeout):
-        super().__init__(app, process)
-        self.wine, self.output, self.listener, self.timeout = wine, output, listener, timeout
+    def __init__(self, platform, app, process, listener, timeout, events, output):
+        super().__init__(platform, app, process, listener, timeout)
+        self.events, self.output = events, output
 
     def finish(self):
         self.process.wait(self.timeout + 30)
-        (events_file, self.output), events = self.output, {}
-        events_file.seek(0)
-        lines = events_file.read().decode().splitlines()
-        if self.listener:
-            self.listener.finish()
-        for line in lines:
-            kind, *fields = line.split()
+        self.events.seek(0)
+        events = {}
+        for kind, *fields in map(str.split, self.events.read().decode().splitlines()):
             events.setdefault(kind, []).append([text(f) if f.startswith("t") else int(f) for f in fields])
         (t, code, killed), = events["exit"]
         seen, gone = events.get("splash"), events.get("splash_gone")
-        return SimpleNamespace(
+        return self.outcome(
             code=code, killed=bool(killed), elapsed=t, stdout=self.output.read_bytes().decode("latin-1"), screen=tuple(events["screen"][0]),
             boxes=[SimpleNamespace(t=b[0], caption=b[1], text=b[2], icon=bool(b[3]), splash=bool(b[4])) for b in events.get("box", [])],
             windows=[dict(zip(("pos", "iconic", "zoomed", "visible", "front"), map(bool, w))) | {"pos": w[0]} for w in events.get("window", [])],
-            splash=seen and {"t": seen[0][0], "rect": seen[0][1:5], "exstyle": seen[0][5], "gone": gone[0][0], "alphas": gone[0][1:]},
-            record=self.app.record(), log=self.wine.read_log(), log_folder=self.wine.log_folder(), listener=self.listener,
-            received=self.listener and self.listener.received)
+            splash=seen and {"t": seen[0][0], "rect": seen[0][1:5], "exstyle": seen[0][5], "gone": gone[0][0], "alphas": gone[0][1:]})

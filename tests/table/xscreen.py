@@ -8,41 +8,33 @@ import subprocess
 import threading
 import time
 
-from Xlib import X, Xatom, display as xdisplay, error as xerror
+from Xlib import X, Xatom, Xutil, display as xdisplay, error as xerror
 from Xlib.ext import xtest
-from Xlib.protocol import event as xevent
 
 
 def connect(name):
-    x = xdisplay.Display(name)
+    for attempt in range(50):  # a new server can refuse its first connections for a moment (seen rarely)
+        try:
+            x = xdisplay.Display(name)
+            break
+        except (xerror.DisplayError, OSError):
+            if attempt == 49:
+                raise
+            time.sleep(0.1)
     x.set_error_handler(lambda *a: None)  # windows come and go while we look
     return x, x.intern_atom, x.screen().root
 
 
 class Display:
     def __init__(self):
-        for _ in range(3):  # a server that gives up, or drops our connection, at start (seen rarely) is started again
-            try:
-                return self.start()
-            except (xerror.DisplayError, xerror.ConnectionClosedError, OSError, RuntimeError):
-                self.close()
-        raise RuntimeError("Xvfb and its window manager did not start")
-
-    def start(self):
-        read, write = os.pipe()  # Xvfb picks a free display and writes its number there
-        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-screen", "0", "1280x1024x24", "-nolisten", "tcp"],
-                                       pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
+        read, write = os.pipe()  # Xvfb picks a free display and writes its number there; -noreset: our
+        # connections coming and going never restart the server under a run
+        self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-noreset", "-screen", "0", "1280x1024x24", "-nolisten",
+                                        "tcp"], pass_fds=[write], stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)]
         os.close(write)
         self.name = ":" + os.read(read, 16).decode().strip()
         os.close(read)
-        for _ in range(100 * (self.name != ":")):
-            try:
-                self.x, self.atom, self.root = connect(self.name)
-                break
-            except (xerror.DisplayError, OSError):  # not listening yet
-                time.sleep(0.1)
-        else:
-            raise RuntimeError("Xvfb did not start")
+        self.x, self.atom, self.root = connect(self.name)
         env = {**os.environ, "DISPLAY": self.name}
         self.procs += [subprocess.Popen(p, env=env, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL) for p in (["openbox"], ["xcompmgr"])]
         # The window manager is ready once it has mapped a window of ours: one that announces itself
@@ -50,39 +42,29 @@ class Display:
         probe = self.root.create_window(0, 0, 10, 10, 0, X.CopyFromParent)
         probe.map()
         for _ in range(200):
-            if self.root.get_full_property(self.atom("_NET_SUPPORTING_WM_CHECK"), X.AnyPropertyType) and \
-                    probe.get_attributes().map_state == X.IsViewable and probe.query_tree().parent != self.root:
+            if probe.get_attributes().map_state == X.IsViewable and probe.query_tree().parent != self.root:
                 break
             time.sleep(0.05)
         else:
             raise RuntimeError("the window manager did not start")
         probe.destroy()
-        self.x.sync()
-
-    def ask_wm(self, window, message, *data):
-        # A client message to the window manager about `window`, as pagers and taskbars send them.
-        event = xevent.ClientMessage(window=window, client_type=self.atom(message), data=(32, (list(data) + [0] * 5)[:5]))
-        self.root.send_event(event, event_mask=X.SubstructureRedirectMask | X.SubstructureNotifyMask)
-        self.x.sync()
 
     def make_windows(self, wanted):
-        # Top-level windows (state, WM_CLASS, _NET_WM_NAME): "i" minimised, "z" maximised, "h" never shown.
-        windows = []
-        for state, cls, title in wanted:
+        # Top-level windows (state, WM_CLASS, _NET_WM_NAME), each asking for its first state: "i"
+        # minimised, "z" maximised, "h" never shown.
+        windows, maximised = [], [self.atom("_NET_WM_STATE_MAXIMIZED_VERT"), self.atom("_NET_WM_STATE_MAXIMIZED_HORZ")]
+        for state, cls, title in wanted or ():
             windows.append(self.root.create_window(50, 50, 300, 200, 0, X.CopyFromParent))
             windows[-1].set_wm_class(cls, cls)
+            windows[-1].set_wm_hints(flags=Xutil.StateHint, initial_state=Xutil.IconicState if state == "i" else Xutil.NormalState)
             if title:
                 windows[-1].change_property(self.atom("_NET_WM_NAME"), self.atom("UTF8_STRING"), 8, title.encode("utf-8", "surrogatepass"))
+            if state == "z":
+                windows[-1].change_property(self.atom("_NET_WM_STATE"), Xatom.ATOM, 32, maximised)
             if state != "h":
                 windows[-1].map()
         self.x.sync()
-        time.sleep(0.5)
-        for window, (state, _, _) in zip(windows, wanted):
-            if state == "z":
-                self.ask_wm(window, "_NET_WM_STATE", 1, self.atom("_NET_WM_STATE_MAXIMIZED_VERT"), self.atom("_NET_WM_STATE_MAXIMIZED_HORZ"))
-            elif state == "i":
-                self.ask_wm(window, "WM_CHANGE_STATE", 3)
-        time.sleep(0.5)
+        time.sleep(0.5 * bool(windows))
         return windows
 
     def window_states(self, windows):
@@ -98,7 +80,7 @@ class Display:
         return states
 
     def close(self):
-        for proc in reversed(getattr(self, "procs", [])):  # none when Xvfb could not even be started
+        for proc in reversed(self.procs):
             proc.terminate()
             proc.wait()
 
