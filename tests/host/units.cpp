@@ -97,20 +97,15 @@ std::vector<Image> PictureTable() {
         Check(read(image) && info.width == 300 && info.height == 200 && info.pixelOffset == 0, "not drawn", bits);
     }
     Check(!read(Image()), "no bytes at all");
-    for (const char* signature : {"BA", "MB", "bm"}) {
-        Image image = Make(24, 4, 4);
-        memcpy(image.data(), signature, 2);
-        Check(!read(image), "signature");
-    }
-    for (uint32_t infoSize : {0u, 12u, 39u, 0xFFFFFFFFu, 0xFFFFFFF0u, 0x80000000u}) {
-        Image image = Make(8, 4, 4);
-        Put(image, 14, infoSize);
-        Check(!read(image), "info header size", long(infoSize));
-    }
-    for (uint32_t side : {0x7FFFFFFFu, 0x40000000u, 0x10000u, 0x80000000u}) {  // rows that would wrap; a height with no positive twin
-        Image image = Make(24, 1, 1);
-        Put(image, 18, side == 0x80000000u ? 1 : side), Put(image, 22, side);
-        Check(!read(image), "dimensions", long(side));
+    struct { int bits; size_t at; uint32_t value, bytes, height; } rejected[] = {  // one field changed (and the height)
+        {24, 0, 'B' | 'A' << 8, 2}, {24, 0, 'M' | 'B' << 8, 2}, {24, 0, 'b' | 'm' << 8, 2},  // signatures
+        {8, 14, 0}, {8, 14, 12}, {8, 14, 39}, {8, 14, 0xFFFFFFFF}, {8, 14, 0xFFFFFFF0}, {8, 14, 0x80000000},  // info header sizes
+        {24, 18, 0x7FFFFFFF, 4, 0x7FFFFFFF}, {24, 18, 0x40000000, 4, 0x40000000}, {24, 18, 0x10000, 4, 0x10000},  // rows that wrap
+        {24, 18, 1, 4, 0x80000000}};  // a height with no positive twin
+    for (auto& r : rejected) {
+        Image image = Make(r.bits, 1, 1);
+        Put(image, r.at, r.value, r.bytes ? r.bytes : 4), Put(image, 22, r.height ? r.height : 1);
+        Check(!read(image), "rejected", long(r.at << 32 | r.value));
     }
     for (int bits : {24, 8, 4, 1}) {  // every cut through headers, table or padded rows is absent
         Image whole = Make(bits, 13, 5);

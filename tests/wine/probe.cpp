@@ -38,8 +38,9 @@ BOOL CALLBACK Collect(HWND window, LPARAM) {
     GetWindowThreadProcessId(window, &pid);
     GetClassNameW(window, name, 64);
     g_all.push_back(window);
-    if (pid == g_pid && IsWindowVisible(window) && lstrcmpW(name, L"#32770") == 0) g_boxes.push_back(window);
-    if (pid == g_pid && IsWindowVisible(window) && lstrcmpW(name, L"SplashScreenWndClass") == 0) g_splash = window;
+    if (pid != g_pid || !IsWindowVisible(window)) return TRUE;
+    if (lstrcmpW(name, L"#32770") == 0) g_boxes.push_back(window);
+    if (lstrcmpW(name, L"SplashScreenWndClass") == 0) g_splash = window;
     return TRUE;
 }
 void Scan() {
@@ -52,25 +53,17 @@ void Pump() {
 
 // The program starts on a thread of its own, which as its debugger also takes its debug events: the
 // main thread waits on the program's windows, and a debuggee stopped at an event would never answer.
-struct Launch {
-    std::wstring exe, cmd, cwd;
-    bool debug;
-    STARTUPINFOW startup;
-    PROCESS_INFORMATION process;
-    HANDLE ready;
-};
+struct Launch { std::wstring exe, cmd, cwd; bool debug; STARTUPINFOW startup; PROCESS_INFORMATION process; HANDLE ready; };
 DWORD WINAPI LaunchThread(LPVOID param) {
     Launch* l = static_cast<Launch*>(param);
     BOOL started = CreateProcessW(l->exe.c_str(), &l->cmd[0], nullptr, nullptr, TRUE, l->debug ? DEBUG_ONLY_THIS_PROCESS : 0,
                                   nullptr, l->cwd.c_str(), &l->startup, &l->process);
     SetEvent(l->ready);
     bool loaderBreak = true;  // the loader's initial breakpoint is ours; every other exception is the program's
-    for (DEBUG_EVENT e; started && l->debug && WaitForDebugEvent(&e, INFINITE);) {
-        bool exception = e.dwDebugEventCode == EXCEPTION_DEBUG_EVENT &&
-                         !(loaderBreak && e.u.Exception.ExceptionRecord.ExceptionCode == EXCEPTION_BREAKPOINT);
+    for (DEBUG_EVENT e; started && l->debug && WaitForDebugEvent(&e, INFINITE) && e.dwDebugEventCode != EXIT_PROCESS_DEBUG_EVENT;) {
+        bool exception = e.dwDebugEventCode == EXCEPTION_DEBUG_EVENT && !(loaderBreak && e.u.Exception.ExceptionRecord.ExceptionCode == EXCEPTION_BREAKPOINT);
         loaderBreak = loaderBreak && e.dwDebugEventCode != EXCEPTION_DEBUG_EVENT;
         ContinueDebugEvent(e.dwProcessId, e.dwThreadId, exception ? DBG_EXCEPTION_NOT_HANDLED : DBG_CONTINUE);
-        if (e.dwDebugEventCode == EXIT_PROCESS_DEBUG_EVENT) break;
     }
     return 0;
 }
@@ -99,16 +92,12 @@ HWND MakeWindow(const std::wstring& className, const std::wstring& title, DWORD 
 int main(int argc, char** argv) {
     Launch launch = {};
     DWORD splashWait = 0, timeout = 120000;
-    std::wstring out;
+    std::map<std::string, std::wstring> texts;
     std::vector<HWND> windows;
     for (int i = 1; i < argc; ++i) {
         std::string key = std::string(argv[i]).substr(0, std::string(argv[i]).find('=')), value = argv[i] + key.size() + 1;
-        std::wstring text;
+        std::wstring& text = texts[key] = L"";
         for (size_t at = 0; at + 4 <= value.size(); at += 4) text += static_cast<wchar_t>(std::stoul(value.substr(at, 4), nullptr, 16));
-        if (key == "exe") launch.exe = text;
-        if (key == "cmd") launch.cmd = text;
-        if (key == "cwd") launch.cwd = text;
-        if (key == "out") out = text;
         if (key == "debug") launch.debug = true;
         if (key == "splash_wait") splashWait = std::stoul(value);
         if (key == "timeout") timeout = std::stoul(value);
@@ -127,10 +116,10 @@ int main(int argc, char** argv) {
     const std::vector<HWND> order = g_all;
 
     SECURITY_ATTRIBUTES inherit = {sizeof inherit, nullptr, TRUE};
-    launch.startup = {sizeof launch.startup};
+    launch.exe = texts["exe"], launch.cmd = texts["cmd"], launch.cwd = texts["cwd"], launch.startup = {sizeof launch.startup};
     launch.startup.dwFlags = STARTF_USESTDHANDLES;
     launch.startup.hStdOutput = launch.startup.hStdError =
-        CreateFileW(out.c_str(), GENERIC_WRITE, FILE_SHARE_READ | FILE_SHARE_WRITE, &inherit, CREATE_ALWAYS, 0, nullptr);
+        CreateFileW(texts["out"].c_str(), GENERIC_WRITE, FILE_SHARE_READ | FILE_SHARE_WRITE, &inherit, CREATE_ALWAYS, 0, nullptr);
     launch.ready = CreateEventW(nullptr, TRUE, FALSE, nullptr);
     CreateThread(nullptr, 0, LaunchThread, &launch, 0, nullptr);
     WaitForSingleObject(launch.ready, INFINITE);
@@ -145,11 +134,9 @@ int main(int argc, char** argv) {
     for (bool ended = process == nullptr; !ended;) {
         ended = WaitForSingleObject(process, 0) == WAIT_OBJECT_0;
         Scan();
-        if (g_splash != nullptr && splash == nullptr) {
-            RECT r;
-            GetWindowRect(splash = g_splash, &r);
+        RECT r;
+        if (g_splash != nullptr && splash == nullptr && GetWindowRect(splash = g_splash, &r))
             printf("splash %lu %ld %ld %ld %ld %ld\n", Now(), r.left, r.top, r.right - r.left, r.bottom - r.top, GetWindowLongW(splash, GWL_EXSTYLE));
-        }
         BYTE alpha = 0;
         if (splash != nullptr && !gone && GetLayeredWindowAttributes(splash, nullptr, &alpha, nullptr) && alpha != lastAlpha)
             alphas += " " + std::to_string(lastAlpha = alpha);

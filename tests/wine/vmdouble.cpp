@@ -12,6 +12,7 @@
 #include <stdarg.h>
 #include <stdio.h>
 
+#include <map>
 #include <string>
 #include <vector>
 
@@ -29,9 +30,9 @@ struct Object { std::string text; std::vector<std::string> items; };  // a class
 std::wstring g_dir;
 Slot g_jni[256], g_invoke[8];
 Table g_env = {g_jni}, g_vm = {g_invoke};
-jint g_create, g_destroy, g_exit = -1;
-unsigned long g_mainMs;
-std::string g_missingClass, g_until, g_missingMethod;
+std::map<std::string, std::string> g_script;  // vm-script.txt
+jint Number(const char* key) { return strtol(g_script[key].c_str(), nullptr, 0); }
+std::string Failed(bool failed) { return failed ? " -> null" : ""; }
 
 void Record(const std::string& line) {
     FILE* file = _wfopen((g_dir + L"\\vm-record.txt").c_str(), L"ab");
@@ -40,32 +41,15 @@ void Record(const std::string& line) {
 }
 void VMD_CALL Trap() { Record("trap"), ExitProcess(0xDEAD); }
 
-void ReadScript() {
-    FILE* file = _wfopen((g_dir + L"\\vm-script.txt").c_str(), L"rb");
-    char line[1024], key[64], value[960];
-    while (file != nullptr && fgets(line, sizeof line, file) != nullptr) {
-        if (sscanf(line, "%63[^=]=%959[^\r\n]", key, value) != 2) continue;
-        std::string k = key;
-        jint number = strtol(value, nullptr, 0);
-        if (k == "create") g_create = number;
-        if (k == "destroy") g_destroy = number;
-        if (k == "exit") g_exit = number;
-        if (k == "main_ms") g_mainMs = number;
-        if (k == "missing_class") g_missingClass = value;
-        if (k == "missing_method") g_missingMethod = " -> null";
-        if (k == "until") g_until = value;
-    }
-    if (file != nullptr) fclose(file);
-}
-
 void* VMD_CALL FindClass(Table*, const char* name) {
-    bool missing = g_missingClass == name;
-    Record(std::string("call FindClass ") + name + (missing ? " -> null" : ""));
+    bool missing = g_script["missing_class"] == name;
+    Record(std::string("call FindClass ") + name + Failed(missing));
     return missing ? nullptr : new Object{name, {}};
 }
 void* VMD_CALL GetStaticMethodID(Table*, Object* owner, const char* name, const char* signature) {
-    Record("call GetStaticMethodID " + owner->text + " " + name + " " + signature + g_missingMethod);
-    return g_missingMethod.empty() ? new Object{name, {}} : nullptr;
+    bool missing = g_script.count("missing_method") != 0;
+    Record("call GetStaticMethodID " + owner->text + " " + name + " " + signature + Failed(missing));
+    return missing ? nullptr : new Object{name, {}};
 }
 void* VMD_CALL NewObjectArray(Table*, jint length, Object* elementClass, void* initial) {
     Record("call NewObjectArray " + std::to_string(length) + " " + elementClass->text + (initial ? " set" : " null"));
@@ -87,13 +71,14 @@ void VMD_CALL CallStaticVoidMethodV(Table*, Object* owner, Object* method, va_li
     Record("call CallStaticVoidMethodV " + owner->text + " " + method->text);
     Record("main " + std::to_string(array->items.size()));
     for (const std::string& item : array->items) Record("arg " + item);
-    std::wstring until = g_dir + L"\\" + std::wstring(g_until.begin(), g_until.end());
-    for (DWORD start = GetTickCount(), limit = g_until.empty() ? g_mainMs : 120000; GetTickCount() - start < limit &&
-         (g_until.empty() || GetFileAttributesW(until.c_str()) == INVALID_FILE_ATTRIBUTES);) Sleep(20);
-    if (g_exit >= 0) ExitProcess(g_exit);
+    std::string until = g_script["until"];
+    std::wstring file = g_dir + L"\\" + std::wstring(until.begin(), until.end());
+    for (DWORD start = GetTickCount(), limit = until.empty() ? Number("main_ms") : 120000; GetTickCount() - start < limit &&
+         (until.empty() || GetFileAttributesW(file.c_str()) == INVALID_FILE_ATTRIBUTES);) Sleep(20);
+    if (g_script.count("exit")) ExitProcess(Number("exit"));
     Record("end");
 }
-jint VMD_CALL DestroyJavaVM(Table*) { return Record("call DestroyJavaVM"), g_destroy; }
+jint VMD_CALL DestroyJavaVM(Table*) { return Record("call DestroyJavaVM"), Number("destroy"); }
 
 template <typename F>
 Slot AsSlot(F function) { return reinterpret_cast<Slot>(function); }
@@ -123,13 +108,16 @@ int vmd_ping() { return 57; }
 #endif
 extern "C" __declspec(dllexport) jint VMD_CALL JNI_CreateJavaVM(Table** vm, void** env, InitArgs* args) {
     vmd_ping();
-    ReadScript();
+    FILE* script = _wfopen((g_dir + L"\\vm-script.txt").c_str(), L"rb");
+    for (char line[1024], key[64], value[960]; script != nullptr && fgets(line, sizeof line, script) != nullptr;)
+        if (sscanf(line, "%63[^=]=%959[^\r\n]", key, value) == 2) g_script[key] = value;
+    if (script != nullptr) fclose(script);
     char head[96];
     snprintf(head, sizeof head, "call JNI_CreateJavaVM 0x%08lx ignoreUnrecognized=%d", args->version, args->ignoreUnrecognized);
     Record(head);
     for (jint i = 0; i < args->count; ++i) Record(std::string("option ") + args->options[i].text + (args->options[i].extraInfo ? " (extraInfo set)" : ""));
-    *vm = g_create == 0 ? &g_vm : nullptr;
-    *env = g_create == 0 ? &g_env : nullptr;
-    return g_create;
+    *vm = Number("create") == 0 ? &g_vm : nullptr;
+    *env = Number("create") == 0 ? &g_env : nullptr;
+    return Number("create");
 }
 #endif
