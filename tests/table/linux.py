@@ -28,11 +28,11 @@ LOCK_NAME = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735.lock"
 
 
 def connect(name):
-    for attempt in range(50):  # a new server can refuse its first connections for a moment (seen rarely)
+    for attempt in range(50):  # a new server can refuse or drop its first connections (seen rarely)
         try:
             x = xdisplay.Display(name)
             break
-        except (xerror.DisplayError, OSError):
+        except (xerror.DisplayError, xerror.ConnectionClosedError, OSError):
             if attempt == 49:
                 raise
             time.sleep(0.1)
