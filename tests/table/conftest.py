@@ -31,6 +31,10 @@ PORT = 6152
 LOG = "QZ-LumiscopeQZ-57Nova/logs/QZ-LumiscopeQZ-57Nova-L.log"
 
 
+def hexed(text):  # four hex digits per UTF-16 unit: how main and the hand-off get every argument
+    return text.encode("utf-16-be", "surrogatepass").hex()
+
+
 class Record:
     def __init__(self, data):
         self.lines = data.decode("latin-1").splitlines()

@@ -28,20 +28,21 @@ LOCK_NAME = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735.lock"
 
 
 def connect(name):
-    for attempt in range(50):  # a new server can refuse or drop its first connections (seen rarely)
-        try:
-            x = xdisplay.Display(name)
-            break
-        except (xerror.DisplayError, xerror.ConnectionClosedError, OSError):
-            if attempt == 49:
-                raise
-            time.sleep(0.1)
+    x = xdisplay.Display(name)
     x.set_error_handler(lambda *a: None)  # windows come and go while we look
     return x, x.intern_atom, x.screen().root
 
 
 class Display:
     def __init__(self):
+        for attempt in range(3):  # a server that refuses every connection at start (seen rarely) is started again
+            try:
+                return self.start()
+            except (xerror.DisplayError, xerror.ConnectionClosedError, OSError, RuntimeError):
+                self.close()
+        raise RuntimeError("Xvfb and its window manager did not start")
+
+    def start(self):
         read, write = os.pipe()  # Xvfb picks a free display and writes its number there; -noreset: our
         # connections coming and going never restart the server under a run
         self.procs = [subprocess.Popen(["Xvfb", "-displayfd", str(write), "-noreset", "-screen", "0", "1280x1024x24", "-nolisten",

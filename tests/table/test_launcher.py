@@ -11,7 +11,7 @@ import re
 import time
 from pathlib import Path
 
-from conftest import Listener, port_free
+from conftest import Listener, hexed, port_free
 
 REINSTALL = "reinstall QZ-Lumiscope QZ-57"
 VM_NOT_LOADED = f"The Java runtime could not be loaded from jre\\bin\\client\\jvm.dll in the application folder. Please {REINSTALL}."
@@ -29,10 +29,6 @@ OUTSIDE_ANSI = "C:\\Users\\\u0418\u0432\u0430\u043d\\\u6587\u6863\\\u05e9\u05dc\
 LONG = "".join(chr(0x4E00 + i) if i % 7 == 0 else chr(0x41 + i % 26) for i in range(5000))
 LONG = LONG[:1022] + "\U0001F600" + LONG[1024:]
 CREATE = "JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1"
-
-
-def hexed(text):
-    return text.encode("utf-16-be", "surrogatepass").hex()
 
 
 def destroyed(result):

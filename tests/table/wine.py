@@ -14,10 +14,6 @@ EXE = "QZ-Lumiscope_QZ-57.exe"
 UNUSABLE = "C:\\windows\\system32\\kernel32.dll\\missing"  # a folder that can neither exist nor be made
 
 
-def hexunits(text):
-    return text.encode("utf-16-be", "surrogatepass").hex()
-
-
 def win(path):
     return "Z:" + str(path).replace("/", "\\")
 
@@ -65,15 +61,15 @@ class Platform(conftest.Platform):
               debug=False, splash=False, log="junk", timeout=120):
         self.reset_log(log)
         output = app.path / "output.txt"  # the program's standard output and error, written by probe.exe
-        probe = [self.env["WINE"], str(self.build / "tests/wine/probe.exe"), "exe=" + hexunits(app.exe), f"timeout={timeout * 1000}",
-                 "cmd=" + hexunits(subprocess.list2cmdline([argv0 or app.exe, *args])), "out=" + hexunits(win(output)),
-                 "cwd=" + hexunits(app.native if cwd == "app" else "C:\\windows")]
+        probe = [self.env["WINE"], str(self.build / "tests/wine/probe.exe"), "exe=" + conftest.hexed(app.exe), f"timeout={timeout * 1000}",
+                 "cmd=" + conftest.hexed(subprocess.list2cmdline([argv0 or app.exe, *args])), "out=" + conftest.hexed(win(output)),
+                 "cwd=" + conftest.hexed(app.native if cwd == "app" else "C:\\windows")]
         probe += ["lock=1"] * lock + ["debug=1"] * debug + ["splash_wait=3000"] * splash
         for name, path in (folders or {}).items():
             if path:
                 (self.drive_c / path[3:].replace("\\", "/")).mkdir(parents=True, exist_ok=True)
-            probe.append("folder=" + hexunits(f"{name}={path or UNUSABLE}"))
-        probe += ["window=" + hexunits(",".join(w)) for w in windows]
+            probe.append("folder=" + conftest.hexed(f"{name}={path or UNUSABLE}"))
+        probe += ["window=" + conftest.hexed(",".join(w)) for w in windows]
         # Events go to a file: Wine's own processes, started on the program's behalf, would hold a pipe open.
         events = tempfile.TemporaryFile()
         process = subprocess.Popen(probe, stdout=events, stderr=subprocess.DEVNULL, stdin=subprocess.DEVNULL, env=self.env)
