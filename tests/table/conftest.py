@@ -89,7 +89,8 @@ def port_free():  # bound to the hand-off port, or the row fails: rows must not 
     sock.setsockopt(socket.SOL_SOCKET, socket.SO_REUSEADDR, 1)
     for _ in range(50):
         try:
-            return sock.bind(("127.0.0.1", PORT)) or sock
+            sock.bind(("127.0.0.1", PORT))
+            return sock
         except OSError:
             time.sleep(0.2)
     pytest.fail(f"port {PORT} is taken by another program")

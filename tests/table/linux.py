@@ -96,7 +96,7 @@ class Display:
         return states
 
     def close(self):
-        for proc in reversed(self.procs):
+        for proc in reversed(getattr(self, "procs", [])):  # none when Xvfb could not even be started
             proc.terminate()
             proc.wait()
 

@@ -23,7 +23,8 @@ MAIN = "com/qz/kpo/emu57/app/ApplicationMainForm"
 NO_SPLASH = "-Dapp.lumiscope57.noSplash=true"
 START, END = [("Preliminary Definitions", 0), ("CL interpretation", 0)], [("Successful launch end.", 0), "end"]
 LOCK_UNITS = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735"  # "QZ-Lumiscope_QZ-57" read as UTF-16
-FRAME, JAVA_FRAME = "COM.QZ.KPO.EMU57.APP.EMULATORFRAME", "com-qz-kpo-emu57-app-ApplicationMainForm"  # Linux: Java's
+FRAME = "COM.QZ.KPO.EMU57.APP.EMULATORFRAME"
+JAVA_FRAME = "com-qz-kpo-emu57-app-ApplicationMainForm"  # the class Java's toolkit gives the frame: counts on Linux only
 OUTSIDE_ANSI = "C:\\Users\\\u0418\u0432\u0430\u043d\\\u6587\u6863\\\u05e9\u05dc\u05d5\u05dd.qz57"
 # 5,000 units, with a surrogate pair across unit 1,023 (where a fixed 4,096-byte buffer would end).
 LONG = "".join(chr(0x4E00 + i) if i % 7 == 0 else chr(0x41 + i % 26) for i in range(5000))
