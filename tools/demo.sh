@@ -127,8 +127,10 @@ while [ $SECONDS -lt $deadline ] && alive; do
         && continue
       splash=$id
       info "splash window $(x_hex "$id") seen after $(since "$t0") s"
-      sleep 0.3   # let it fade in a little
-      shot "$out/0-splash.png" "$id"
+      # The window's own contents, not the screen: the Java frame may cover the splash within
+      # a fraction of a second, and while it fades in the screen shows it only faintly.
+      sleep 0.2
+      X import -window "$id" "$out/0-splash.png" 2>/dev/null && info "screenshot: $out/0-splash.png"
       break
     done
   fi
