@@ -14,7 +14,7 @@ log() { printf '[install-deps] %s\n' "$*"; }
 APT_OPTS=(-y -q -o Dpkg::Use-Pty=0)
 
 BASE_PKGS=(
-  cmake ninja-build make python3 python3-pytest iproute2  # pytest: the scenario table (tests/table)
+  cmake ninja-build make python3
   g++-mingw-w64-i686 g++-mingw-w64-x86-64 binutils-mingw-w64-i686 binutils-mingw-w64-x86-64
   wine wine64 xvfb xdotool x11-utils imagemagick xcompmgr
   g++ libx11-dev

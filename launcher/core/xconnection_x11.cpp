@@ -29,7 +29,7 @@ void ResolveXlib() {
     xlibLoaded = true;
 }
 
-// At most one connection per user at a time: the splash, the window search and the dialog.
+// The connections open at once: the splash's, the window search's and the dialog's, and one to spare.
 const int kSlots = 4;
 std::atomic<XConnection*> connections[kSlots];
 XErrorHandler previousErrorHandler = nullptr;
