@@ -24,6 +24,9 @@ BASE_PKGS=(
   python3-matplotlib time                   # make bench: the plot, peak memory
   clang libclang-rt-dev  # libFuzzer: the fuzz targets of tests/host
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
+  dpkg-dev nsis                             # make package: dpkg-shlibdeps for the Debian package, makensis
+  lintian appstream desktop-file-utils      # the package checks
+  debootstrap libglib2.0-bin xdg-utils      # a minimal Debian 12 to install into; the desktop's opener
 )
 
 if ! dpkg --print-foreign-architectures | grep -qx i386; then
