@@ -16,6 +16,10 @@ for arch in i686 x86_64; do
   else notes+=("$arch: built, NOT tested: Wine cannot run it here"); status=1; fi
 done
 [[ $platforms == *wine* ]] || { notes+=("no Windows architecture was tested"); status=1; }
+# The Debian package's tests install it into a minimal Debian 12 with its dependencies downloaded
+# beforehand, here, where the network is (the table then runs without one).
+bash tests/package/prepare-root.sh "$build/linux/package-root" dist/qz-lumiscope-qz57_*_amd64.deb ||
+  notes+=("Debian package: not installed: $(cat "$build/linux/package-root/not-ready" 2>/dev/null)")
 # In a network namespace of its own where root may: the hand-off port 6152 is machine-wide.
 isolate=(); unshare -n true 2>/dev/null && isolate=(unshare -n)
 "${isolate[@]}" sh -c 'ip link set lo up 2>/dev/null; exec /usr/bin/python3 -m pytest tests/table -p no:cacheprovider -q -rfEs \

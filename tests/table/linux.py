@@ -1,5 +1,5 @@
-# The table's Linux platform: the Linux build hosting the real JVM of a private runtime
-# (tools/make-jre.sh) with the Java test application of tests/app, in a home, runtime folder (the
+# The table's Linux platform: the Linux build hosting the real JVM of its private runtime
+# (runtime/jre of the build) with the Java test application of tests/app, in a home, runtime folder (the
 # instance lock) and settings folders of the table's own; headless (display=False) or on what a user
 # sees: a private Xvfb with a window manager (openbox) and a compositor, and a watcher that records,
 # during one run, the splash window (its rectangle, the opacities it shows, when it came and went) and
@@ -188,7 +188,6 @@ class Platform(conftest.Platform):
         self.build, self.state = (ROOT / build / "linux").resolve(), Path(tempfile.mkdtemp(prefix="qz57-table."))
         self.home, self.run_dir = self.state / "home", self.state / "run"
         super().__init__(f"linux-{arch}", self.state / "apps", self.home / "Documents", "/")
-        subprocess.run(["bash", ROOT / "tools/make-jre.sh", self.build / "table"], check=True, capture_output=True)
         nomain = self.state / "nomain/com/qz/kpo/emu57/app/ApplicationMainForm.java"  # a main class without main
         nomain.parent.mkdir(parents=True)
         nomain.write_text("package com.qz.kpo.emu57.app;\npublic class ApplicationMainForm {}\n")
@@ -222,7 +221,7 @@ class Platform(conftest.Platform):
         (path / EXE).chmod(0o755)
         (path / "emu57.jar").write_bytes((self.state / jar / jar).read_bytes() if jar else b"")
         if runtime == "double":
-            (path / "jre").symlink_to(self.build / "table/jre")
+            (path / "jre").symlink_to(self.build / "runtime/jre")
         elif runtime == "noentry":
             shutil.copytree(self.state / "noentry", path / "jre/lib/server")
         return conftest.App(path, str(path), str(path / EXE))
