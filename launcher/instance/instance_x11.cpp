@@ -19,6 +19,7 @@
 #include <poll.h>
 #include <signal.h>
 #include <stdlib.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <time.h>
 #include <unistd.h>
@@ -175,14 +176,16 @@ void ActivateOnDisplay() {
 
 // The walk runs in a child process, which is ended when it is not done in time: Xlib offers no
 // time-out of its own, and a thread stuck inside it could not be stopped. The child's end closes its
-// side of the pipe, which is what the wait looks for.
+// side of the pipe, which is what the wait looks for. A child whose parent is killed meanwhile goes
+// with it rather than wait on the display for good.
 void ActivateRunningInstances() {
     int done[2];
     if (pipe2(done, O_CLOEXEC) != 0) return;
+    pid_t parent = getpid();
     pid_t walker = fork();
     if (walker == 0) {
         close(done[0]);
-        ActivateOnDisplay();
+        if (prctl(PR_SET_PDEATHSIG, SIGKILL) == 0 && getppid() == parent) ActivateOnDisplay();
         _exit(0);
     }
     close(done[1]);
