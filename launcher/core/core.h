@@ -74,8 +74,8 @@ char16_t* WideCopy(const char* text);
 // is cut). On Windows this is the C runtime's own formatter, which keeps the executable small.
 void FormatText(char* out, size_t size, const char* format, ...);
 
-// printf to standard output (the launcher's two diagnostics that a windowed process normally loses).
-// Kept in the platform file so every caller gets the C runtime's own printf.
+// Windows only: printf to standard output (the launcher's two diagnostics that a windowed process
+// normally loses). Kept in the platform file so every caller gets the C runtime's own printf.
 void PrintText(const char* format, ...);
 
 // Length in UTF-16 units of a zero-terminated text.

@@ -28,4 +28,9 @@ char* LoadMessageText(int32_t id);
 // the dialog could not be shown; the caller has written the standard-error line already.
 bool ShowErrorDialog(const char* caption, const char* text);
 
+// POSIX only (messages_posix.cpp): one line "QZ-Lumiscope_QZ-57: <cause>" on standard error that
+// names what a user or packager can act on (the loader's or the system's text, the JNI code). The
+// boxes say what failed in the product's words; this line says why. Any thread.
+void ReportCause(const char* format, ...);
+
 #endif

@@ -3,6 +3,7 @@
 // that the launch waits for, as it waits for a message box on Windows.
 #include "messages.h"
 
+#include <stdarg.h>
 #include <stdio.h>
 #include <string.h>
 
@@ -42,4 +43,14 @@ void ShowErrorBox(const char* text) {
     fprintf(stderr, "%s: %s\n", caption, text);
     fflush(stderr);
     ShowErrorDialog(caption, text);
+}
+
+void ReportCause(const char* format, ...) {
+    char cause[1024];
+    va_list args;
+    va_start(args, format);
+    vsnprintf(cause, sizeof cause, format, args);
+    va_end(args);
+    fprintf(stderr, "QZ-Lumiscope_QZ-57: %s\n", cause);
+    fflush(stderr);
 }

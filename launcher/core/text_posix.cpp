@@ -112,10 +112,3 @@ void FormatText(char* out, size_t size, const char* format, ...) {
     vsnprintf(out, size, format, args);
     va_end(args);
 }
-
-void PrintText(const char* format, ...) {
-    va_list args;
-    va_start(args, format);
-    vprintf(format, args);
-    va_end(args);
-}

@@ -2,7 +2,7 @@
 // window, and forwarding of a second instance's arguments over local TCP.
 //
 // Callers: the start-up sequence, on the main thread, in this order: AcquireInstanceLock; when it
-// fails, ActivateRunningInstances then ForwardArguments. Nothing here logs or shows anything.
+// fails, ActivateRunningInstances then ForwardArguments. Nothing here logs or shows a box.
 // Platform files: instance_win32.cpp (lock, windows, sockets), instance_posix.cpp (lock, sockets),
 // instance_x11.cpp (windows).
 #ifndef LAUNCHER_INSTANCE_INSTANCE_H
@@ -11,11 +11,13 @@
 #include "../core/core.h"
 
 // Takes the per-user lock `name`, held until the process ends. True for the first instance; false
-// when the name already exists (another instance runs) and on any other failure.
+// when the name already exists (another instance runs). Any other failure is false on Windows too;
+// on POSIX it is said on standard error and the start goes on as the first instance (true).
 bool AcquireInstanceLock(const char16_t* name);
 
 // Restores (when minimised) and brings to the front every visible top-level window that passes the
-// title and class tests, in enumeration order; the last one treated ends in front.
+// title and class tests, in enumeration order; the last one treated ends in front. Under X11 it
+// returns after about two seconds at the most, whatever the display does.
 void ActivateRunningInstances();
 
 // Sends argv[1..argc-1], each encoded as the VM host encodes main's arguments, to the running

@@ -4,8 +4,9 @@
 // title, the byte-wise title test, a class, the class test.
 //
 // Main thread only, on a connection of its own that is closed before returning. Nothing here may
-// stall the second instance: a window that vanishes mid-walk only fails its own tests, and a lost
-// connection ends the walk.
+// stall the second instance: a window that vanishes mid-walk only fails its own tests, a lost
+// connection ends the walk, and a display that does not answer at all (a stopped server, a remote
+// one gone quiet) gets two seconds in all, after which the hand-off goes on without the walk.
 #include "instance.h"
 
 #include "../core/xconnection_x11.h"
@@ -13,7 +14,14 @@
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
 #include <X11/Xutil.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <poll.h>
+#include <signal.h>
 #include <stdlib.h>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <time.h>
 #include <unistd.h>
 
 namespace {
@@ -21,6 +29,7 @@ namespace {
 const size_t kClassUnits = 1024;  // the most of a class name that is compared
 const int kActivationChecks = 25;
 const useconds_t kActivationCheckUs = 10000;
+const int kActivationLimitMs = 2000;  // the whole walk, connecting to the display included
 
 // The first 32-bit item of property `name` of type `type` (both by name), or 0.
 long FirstItem(Display* display, Window window, const char* name, const char* type) {
@@ -113,9 +122,15 @@ void ActivateIfFrame(Display* display, Window root, Window window, bool managed)
     }
 }
 
-}  // namespace
+int64_t NowMs() {
+    timespec now;
+    clock_gettime(CLOCK_MONOTONIC, &now);
+    return static_cast<int64_t>(now.tv_sec) * 1000 + now.tv_nsec / 1000000;
+}
 
-void ActivateRunningInstances() {
+// The walk itself, unbounded: Xlib waits for the display without a time-out, in XOpenDisplay and
+// in every round trip after it.
+void ActivateOnDisplay() {
     // Errors of our own requests (a window that went away mid-walk: BadWindow) only make that
     // window fail its test; a lost connection ends the walk.
     XConnection connection;
@@ -155,4 +170,34 @@ void ActivateRunningInstances() {
     if (children != nullptr) Xlib.XFree(children);
     Xlib.XSync(display, False);
     CloseXConnection(&connection);
+}
+
+}  // namespace
+
+// The walk runs in a child process, which is ended when it is not done in time: Xlib offers no
+// time-out of its own, and a thread stuck inside it could not be stopped. The child's end closes its
+// side of the pipe, which is what the wait looks for. A child whose parent is killed meanwhile goes
+// with it rather than wait on the display for good.
+void ActivateRunningInstances() {
+    int done[2];
+    if (pipe2(done, O_CLOEXEC) != 0) return;
+    pid_t parent = getpid();
+    pid_t walker = fork();
+    if (walker == 0) {
+        close(done[0]);
+        if (prctl(PR_SET_PDEATHSIG, SIGKILL) == 0 && getppid() == parent) ActivateOnDisplay();
+        _exit(0);
+    }
+    close(done[1]);
+    if (walker > 0) {
+        int64_t deadline = NowMs() + kActivationLimitMs;
+        pollfd end = {done[0], POLLIN, 0};
+        for (int64_t left = kActivationLimitMs; left > 0; left = deadline - NowMs()) {
+            if (poll(&end, 1, static_cast<int>(left)) >= 0 || errno != EINTR) break;
+        }
+        kill(walker, SIGKILL);
+        while (waitpid(walker, nullptr, 0) < 0 && errno == EINTR) {
+        }
+    }
+    close(done[0]);
 }

@@ -25,7 +25,8 @@ Status CallJavaMain(const char* className, char16_t** argv, int32_t argc) {
     }
     free(encoded.text);
 
-    // Runs the Java application's main thread; an exception thrown out of main goes unnoticed.
+    // Runs the Java application's main thread; an exception thrown out of main is left pending, for
+    // the platform to describe or not (DescribeJavaException).
     env->CallStaticVoidMethod(mainClass, mainMethod, arguments);
     return kStatusOk;
 }

@@ -53,6 +53,10 @@ Status LoadPrivateRuntime();
 // The settings-folder inputs of the option list: userAppDataFound, userAppData, commonAppDataFound.
 // `userAppData` points into storage that lives until the VM is created.
 void FindSettingsFolders(VmOptionInputs* inputs);
+// After CallJavaMain: what became of a Java exception that the lookups left or main threw. POSIX
+// describes it on standard error as Java's own launcher does; Windows leaves it unnoticed, as that
+// launcher always has.
+void DescribeJavaException();
 
 enum { kFolderPathUnits = 260 };
 // The special-folder paths reach the VM as the low 8 bits of each of the buffer's 260 units, with

@@ -77,6 +77,8 @@ Status LoadPrivateRuntime() {
     return loaded;
 }
 
+void DescribeJavaException() {}
+
 // Both folder queries without creating anything; a failed query only drops its option. The
 // per-user path reaches the VM as the low byte of each of its 260 units, on purpose.
 void FindSettingsFolders(VmOptionInputs* inputs) {

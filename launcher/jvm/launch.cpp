@@ -44,7 +44,9 @@ Status LaunchJavaApplication(int32_t argc, char16_t** argv) {
     }
 
     // Returns when the Java main method has returned.
-    if (CallJavaMain(LAUNCHER_MAIN_CLASS, argv, argc) != kStatusOk) ShowMessageBox(kMessageMainClassNotCalled);
+    Status called = CallJavaMain(LAUNCHER_MAIN_CLASS, argv, argc);
+    DescribeJavaException();
+    if (called != kStatusOk) ShowMessageBox(kMessageMainClassNotCalled);
 
     // Waits for the Java application's last non-daemon thread. The box is shown on every return
     // through here, success included; it is how the launcher reports the VM's end.

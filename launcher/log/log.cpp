@@ -17,8 +17,8 @@ uint32_t g_lastResult = 0;
 const char16_t kSeparator[] = u" : ";
 const char16_t kLineEnd[] = u"\r\n";
 
-// One piece: the text without its terminator, one write. A failure is reported on standard output
-// (normally lost in a windowed process) and the line goes on with its next piece.
+// One piece: the text without its terminator, one write. A failure is told to the platform (a text
+// no user sees) and the line goes on with its next piece.
 int WritePiece(const char16_t* piece) {
     uint32_t bytes = static_cast<uint32_t>(Utf16Length(piece) * sizeof(char16_t));
     uint32_t written = 0;
@@ -28,7 +28,7 @@ int WritePiece(const char16_t* piece) {
     g_lastWritten = written;
     g_lastResult = ok ? 1 : 0;
     if (!ok) {
-        PrintText("WriteFile failed with error %d.\n", static_cast<int>(error));
+        LogPlatformWriteFailed(error);
         return 5;
     }
     return 0;

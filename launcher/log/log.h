@@ -33,5 +33,9 @@ LogHandle LogPlatformOpen(const char16_t* path);
 // Writes `bytes` bytes at the current position; returns false and the error code on failure.
 bool LogPlatformWrite(LogHandle handle, const void* data, uint32_t bytes, uint32_t* written, uint32_t* error);
 void LogPlatformClose(LogHandle handle);
+// A failed write, told where the platform tells it: Windows prints "WriteFile failed with error N."
+// on standard output, which a windowed process does not have; POSIX keeps it to the log's own
+// bookkeeping, since standard output there is the user's terminal.
+void LogPlatformWriteFailed(uint32_t error);
 
 #endif

@@ -38,3 +38,5 @@ bool LogPlatformWrite(LogHandle handle, const void* data, uint32_t bytes, uint32
 void LogPlatformClose(LogHandle handle) {
     if (handle >= 0) close(static_cast<int>(handle));
 }
+
+void LogPlatformWriteFailed(uint32_t) {}

@@ -19,3 +19,5 @@ bool LogPlatformWrite(LogHandle handle, const void* data, uint32_t bytes, uint32
 }
 
 void LogPlatformClose(LogHandle handle) { CloseHandle(reinterpret_cast<HANDLE>(handle)); }
+
+void LogPlatformWriteFailed(uint32_t error) { PrintText("WriteFile failed with error %d.\n", static_cast<int>(error)); }

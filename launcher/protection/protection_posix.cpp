@@ -5,6 +5,9 @@
 // that tools/stamp_checksum.py fills with the file's checksum (those four bytes counted as zero).
 #include "protection.h"
 
+#include "../core/messages.h"
+
+#include <errno.h>
 #include <fcntl.h>
 #include <stdio.h>
 #include <stdlib.h>
@@ -30,7 +33,10 @@ const off_t kLargestImage = 64l << 20;
 // virtual machine, the mapping about 0.05 ms).
 Status ProtectionCheckImage() {
     int file = open("/proc/self/exe", O_RDONLY | O_CLOEXEC);
-    if (file < 0) return kProtectionImageUnreadable;
+    if (file < 0) {
+        ReportCause("cannot read its own file /proc/self/exe: %s", strerror(errno));
+        return kProtectionImageUnreadable;
+    }
     Status result = kProtectionImageUnreadable;
     struct stat info;
     if (fstat(file, &info) == 0 && info.st_size > 0 && info.st_size < kLargestImage) {
@@ -48,6 +54,8 @@ Status ProtectionCheckImage() {
         }
     }
     close(file);
+    if (result == kProtectionImageAltered) ReportCause("its own file was altered after it was built; please reinstall it");
+    if (result == kProtectionImageUnreadable) ReportCause("cannot check its own file /proc/self/exe (unreadable or unstamped)");
     return result;
 }
 
@@ -61,7 +69,9 @@ Status ProtectionCheckDebugger() {
         if (strncmp(line, "TracerPid:", 10) == 0) tracer = strtol(line + 10, nullptr, 10);
     }
     fclose(status);
-    return tracer != 0 ? kProtectionDebuggerLocal : kProtectionPassed;
+    if (tracer == 0) return kProtectionPassed;
+    ReportCause("it does not run under a debugger or tracer (process %ld is tracing it)", tracer);
+    return kProtectionDebuggerLocal;
 }
 
 #else

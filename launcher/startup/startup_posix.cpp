@@ -11,11 +11,14 @@
 
 #include "../core/messages.h"
 
+#include <errno.h>
+#include <fcntl.h>
 #include <pthread.h>
 #include <stdio.h>
 #include <stdlib.h>
 #include <string.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 namespace {
 
@@ -32,8 +35,16 @@ const char kLogRelativePath[] = "/QZ-LumiscopeQZ-57Nova/logs/QZ-LumiscopeQZ-57No
 bool ReadDocumentsSetting(const char* configHome, const char* home, char* out, size_t size) {
     char file[4096];
     FormatText(file, sizeof file, "%s/user-dirs.dirs", configHome);
-    FILE* dirs = fopen(file, "re");
-    if (dirs == nullptr) return false;
+    // Only a regular file is read, and opening never waits: a FIFO in its place would otherwise
+    // hold the start before anything shows.
+    int descriptor = open(file, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (descriptor < 0) return false;
+    struct stat info;
+    FILE* dirs = fstat(descriptor, &info) == 0 && S_ISREG(info.st_mode) ? fdopen(descriptor, "r") : nullptr;
+    if (dirs == nullptr) {
+        close(descriptor);
+        return false;
+    }
     bool found = false;
     char line[4096];
     const char kKey[] = "XDG_DOCUMENTS_DIR=\"";
@@ -101,6 +112,12 @@ char16_t** SplitCommandLine(int32_t* argc) {
 void EnterApplicationDirectory(const char16_t*) { EnterExecutableDirectory(); }
 
 int main(int argc, char** argv) {
+    // Standard input, output or error left closed by whoever started us would go to the first files
+    // opened (the log, the lock), and the VM's and the Java application's output into them: each
+    // closed one is held by /dev/null before anything else is opened.
+    for (int stream = 0; stream <= 2; ++stream) {
+        if (fcntl(stream, F_GETFD) < 0 && errno == EBADF && open("/dev/null", O_RDWR) < 0) break;
+    }
     processArgc = argc;
     processArgv = argv;
     Status result = 0;

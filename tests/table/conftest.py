@@ -7,11 +7,13 @@
 # .stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
 # cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
 # unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
-# long old log first, "nofolder", "keep"); Linux also display=False.
+# long old log first, "nofolder", "keep"), timeout; Linux also display=False|"silent" (never answers),
+# lock_folder ("foreign", "link"), settings="fifo", closed (standard streams), limits ({"nofile": N,
+# "address_space": BYTES}), env (more variables); app(runtime="fifo"|"cut:N") (libjvm.so cut to N bytes).
 #
 # vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
 # missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
-# exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw=1.
+# exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw=1, say=1 (prints on both streams).
 # vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
 # JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
 # (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.

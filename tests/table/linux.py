@@ -1,14 +1,22 @@
 # The table's Linux platform: the Linux build hosting the real JVM of its private runtime
-# (runtime/jre of the build) with the Java test application of tests/app, in a home, runtime folder (the
-# instance lock) and settings folders of the table's own; headless (display=False) or on what a user
-# sees: a private Xvfb with a window manager (openbox) and a compositor, and a watcher that records,
-# during one run, the splash window (its rectangle, the opacities it shows, when it came and went) and
-# every dialog (its caption, whether it had the keyboard focus and the splash was still up),
-# dismissing each with a real key press.
+# (runtime/jre of the build) with the Java test application of tests/app, in a home and settings folders of
+# the table's own, and in a mount namespace of its own whose tmpfs covers the folder of the instance
+# lock (the account's ~/.cache: the launcher takes no environment variable's word for it), so that no
+# other run on the machine meets the table's locks; headless (display=False), on a display that takes
+# connections and never answers (display="silent"), or on what a user sees: a private Xvfb with a
+# window manager (openbox) and a compositor, and a watcher that records, during one run, the splash
+# window (its rectangle, the opacities it shows, when it came and went) and every dialog (its
+# caption, whether it had the keyboard focus and the splash was still up), dismissing each with a real
+# key press.
+import ctypes
 import fcntl
 import os
+import pwd
+import resource
 import select
+import socket
 import shutil
+import signal
 import subprocess
 import tempfile
 import threading
@@ -24,7 +32,35 @@ import conftest
 ROOT = Path(__file__).resolve().parents[2]
 EXE, CAPTIONS = "QZ-Lumiscope_QZ-57", ("QZ-Lumiscope QZ-57", "Error")
 JDK = Path("/usr/lib/jvm/java-17-openjdk-amd64/bin")
-LOCK_NAME = "\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735.lock"
+CACHE = Path(pwd.getpwuid(os.getuid()).pw_dir) / ".cache"  # the lock's folder is QZ-Lumiscope_QZ-57 in it
+LOCK_NAME = f"\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735@{os.uname().nodename.replace('/', '_')}.lock"
+LIMITS = {"nofile": resource.RLIMIT_NOFILE, "address_space": resource.RLIMIT_AS}
+setns = ctypes.CDLL(None, use_errno=True).setns
+
+
+def silent_display():  # a listening X socket (abstract, in the table's network namespace) that never answers
+    for number in range(7000, 7100):
+        sock = socket.socket(socket.AF_UNIX)
+        try:
+            sock.bind(f"\0/tmp/.X11-unix/X{number}")
+        except OSError:
+            sock.close()
+            continue
+        sock.listen(8)
+        return sock, f":{number}"
+    raise RuntimeError("no free display number for a silent display")
+
+
+def entering(namespace, cwd, closed, limits):  # run in the child before exec: the table's mount namespace,
+    def enter():                                # then standard streams closed and limits, as the row asks
+        if setns(namespace, 0x00020000) != 0:   # CLONE_NEWNS
+            os._exit(126)
+        os.chdir(cwd)  # entering a mount namespace leaves the working folder at its root
+        for fd in closed:
+            os.close(fd)
+        for name, value in limits.items():
+            resource.setrlimit(LIMITS[name], (value, value))
+    return enter
 
 
 def connect(name):
@@ -182,11 +218,11 @@ class Watcher(threading.Thread):
 
 
 class Platform(conftest.Platform):
-    write_failed, raised = "WriteFile failed with error 9.\n", 3  # the Java toolkit's frame class counts here
+    write_failed, raised = "", 3  # a failed log write is told nowhere a user sees; the Java toolkit's frame class counts
 
     def __init__(self, arch, build):
         self.build, self.state = (ROOT / build / "linux").resolve(), Path(tempfile.mkdtemp(prefix="qz57-table."))
-        self.home, self.run_dir = self.state / "home", self.state / "run"
+        self.home = self.state / "home"
         super().__init__(f"linux-{arch}", self.state / "apps", self.home / "Documents", "/")
         nomain = self.state / "nomain/com/qz/kpo/emu57/app/ApplicationMainForm.java"  # a main class without main
         nomain.parent.mkdir(parents=True)
@@ -196,8 +232,14 @@ class Platform(conftest.Platform):
             subprocess.run([JDK / "jar", "cf", self.state / name / name, "-C", self.state / name / "c", "."], check=True)
         (self.state / "noentry").mkdir()
         subprocess.run(["cc", "-shared", "-x", "c", "-", "-o", self.state / "noentry/libjvm.so"], input=b"int nothing;\n", check=True)
-        self.run_dir.mkdir(mode=0o700)
         (self.home / ".config").mkdir(parents=True)
+        CACHE.mkdir(mode=0o700, exist_ok=True)
+        self.holder = subprocess.Popen(["unshare", "--mount", "--propagation", "private", "sh", "-c",
+                                        'mount -t tmpfs -o mode=0700 qz57-table "$0" && echo ready && exec sleep infinity', CACHE],
+                                       stdout=subprocess.PIPE)
+        assert self.holder.stdout.readline() == b"ready\n", "the Linux rows need a mount namespace of their own (root)"
+        self.namespace = os.open(f"/proc/{self.holder.pid}/ns/mnt", os.O_RDONLY)
+        self.lock_folder = Path(f"/proc/{self.holder.pid}/root{CACHE}/QZ-Lumiscope_QZ-57")  # as the launcher sees it
         self.display, self.picture, self.screen = Display(), (480, 300), (1280, 1024)
 
     def text(self, text):  # the one text that names the runtime's library
@@ -205,7 +247,19 @@ class Platform(conftest.Platform):
 
     def close(self):
         self.display.close()
+        self.holder.kill()
         shutil.rmtree(self.state, ignore_errors=True)
+
+    def reset_lock_folder(self, how=None):  # gone, "ours", "foreign" (another user's), "link" (a symbolic link to one of ours)
+        if self.lock_folder.is_symlink():
+            self.lock_folder.unlink()
+        shutil.rmtree(self.lock_folder, ignore_errors=True)
+        if how == "link":
+            (self.lock_folder.parent / "elsewhere").mkdir(mode=0o700, exist_ok=True)
+            self.lock_folder.symlink_to("elsewhere")
+        elif how:
+            self.lock_folder.mkdir(mode=0o700)
+            os.chown(self.lock_folder, 1 if how == "foreign" else os.getuid(), -1)
 
     def folder_options(self):
         config = str(self.home / ".config")
@@ -224,26 +278,42 @@ class Platform(conftest.Platform):
             (path / "jre").symlink_to(self.build / "runtime/jre")
         elif runtime == "noentry":
             shutil.copytree(self.state / "noentry", path / "jre/lib/server")
+        elif runtime == "fifo":
+            (path / "jre/lib/server").mkdir(parents=True)
+            os.mkfifo(path / "jre/lib/server/libjvm.so")
+        elif runtime.startswith("cut:"):  # the real library cut to N bytes (a negative N: N bytes short)
+            data = (self.build / "runtime/jre/lib/server/libjvm.so").read_bytes()
+            (path / "jre/lib/server").mkdir(parents=True)
+            (path / "jre/lib/server/libjvm.so").write_bytes(data[:int(runtime[4:])])
         return conftest.App(path, str(path), str(path / EXE))
 
     def start(self, app, args=(), argv0=None, cwd=None, lock=False, listener=None, folders=None, windows=(),
-              debug=False, splash=False, log="junk", display=True, timeout=120):
+              debug=False, splash=False, log="junk", display=True, timeout=120, lock_folder=None, settings=None,
+              closed=(), limits={}, env=None):
         self.reset_log(log)
-        env = {"PATH": os.environ["PATH"], "HOME": str(self.home), "XDG_RUNTIME_DIR": str(self.run_dir), "LANG": "C.UTF-8",
-               **({"DISPLAY": self.display.name} if display else {})}
+        silent = display == "silent" and silent_display()
+        env = {"PATH": os.environ["PATH"], "HOME": str(self.home), "LANG": "C.UTF-8", **(env or {}),
+               **({"DISPLAY": silent[1] if silent else self.display.name} if display else {})}
         env.update({name: value or str(self.state / "missing") for name, value in (folders or {}).items()})
         command = [app.exe, *(a if isinstance(a, bytes) else a.encode() for a in args)]
         if argv0 == "bare":  # started through PATH by its bare name
             env["PATH"], command[0] = f"{app.path}:{env['PATH']}", EXE
-        held = open(self.run_dir / LOCK_NAME, "w") if lock else None
+        if lock or lock_folder:
+            self.reset_lock_folder(lock_folder or "ours")
+        held = lock and open(self.lock_folder / LOCK_NAME, "w")
         if held:
             fcntl.flock(held, fcntl.LOCK_EX)
+        if settings == "fifo":  # user-dirs.dirs, the settings file read first of all
+            os.mkfifo(self.home / ".config/user-dirs.dirs")
         output, started = tempfile.TemporaryFile(), time.monotonic()
-        watcher, made = display and Watcher(self.display.name, started), self.display.make_windows(windows)
+        watcher, made = display is True and Watcher(self.display.name, started), self.display.make_windows(windows)
+        cwd = str(app.path) if cwd == "app" else "/"
         process = subprocess.Popen(["strace", "-f", "-o", "/dev/null"] * debug + command, stdout=output, stderr=subprocess.PIPE,
-                                   stdin=subprocess.DEVNULL, cwd=app.path if cwd == "app" else "/", env=env)
+                                   stdin=subprocess.DEVNULL, cwd=cwd, env=env, start_new_session=True,
+                                   preexec_fn=entering(self.namespace, cwd, closed, limits))
         return Running(self, app, process, listener, timeout, SimpleNamespace(output=output, held=held, started=started,
-                                                                               watcher=watcher, made=made))
+                                                                               watcher=watcher, made=made, silent=silent,
+                                                                               lock_folder=lock_folder, settings=settings))
 
 
 class Running(conftest.Running):
@@ -254,8 +324,8 @@ class Running(conftest.Running):
     def finish(self):
         try:
             stderr = self.process.communicate(timeout=self.timeout)[1].decode("utf-8", "replace")
-        except subprocess.TimeoutExpired:
-            self.process.kill()
+        except subprocess.TimeoutExpired:  # the launcher and whatever it started, which may hold its output open
+            os.killpg(self.process.pid, signal.SIGKILL)
             stderr = self.process.communicate()[1].decode("utf-8", "replace")
         run, elapsed = self.run, (time.monotonic() - self.run.started) * 1000
         splash, dialogs = run.watcher.finish() if run.watcher else (None, [])
@@ -264,9 +334,17 @@ class Running(conftest.Running):
             window.destroy()
         if run.held:
             run.held.close()
+        if run.silent:
+            run.silent[0].close()
+        if run.lock_folder:
+            self.platform.reset_lock_folder()
+        if run.settings:
+            (self.platform.home / ".config/user-dirs.dirs").unlink()
         run.output.seek(0)
         # A parent sees the low 8 bits of the exit status; the whole result stands on standard error.
         code, boxes = self.process.returncode, []
+        # What the user or packager can act on: the launcher's cause lines and a Java exception's description.
+        causes = [line for line in stderr.splitlines() if line.startswith((f"{EXE}: ", "Exception in thread "))]
         for caption, _, text in (line.partition(": ") for line in stderr.splitlines()):
             if caption in CAPTIONS and text.startswith("launch ended with result "):
                 assert int(text.split()[-1]) & 0xFF == code & 0xFF
@@ -280,4 +358,4 @@ class Running(conftest.Running):
             for box, dialog in zip(boxes, dialogs):
                 box.splash, box.t = dialog["splash"], dialog["t"]
         return self.outcome(code=code, killed=self.process.returncode == -9, elapsed=elapsed, stdout=run.output.read().decode(),
-                            boxes=boxes, splash=splash, screen=self.platform.screen, windows=windows)
+                            boxes=boxes, splash=splash, screen=self.platform.screen, windows=windows, causes=causes)

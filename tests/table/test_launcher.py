@@ -5,7 +5,9 @@
 # splash (seen or not; when seen, up at every box, centred, fading in); options ("fixed" and
 # "folders" stand for the platform's lists); main_args (what main got, decoded); calls (JNI calls,
 # Windows double); vm_loaded (anything in the VM record); log ((message, code) lines after the start
-# line, "end"; [] no file); received (bytes on 6152: one connection, closed by the sender); stdout.
+# line, "end"; [] no file); received (bytes on 6152: one connection, closed by the sender); stdout;
+# causes (Linux: the standard-error lines naming a failure's cause, each holding its text, in order;
+# none when not given).
 import os
 import re
 import time
@@ -56,14 +58,15 @@ ROWS = [
     Row("destroy-negative-no-strings", ["-noSplash"], app=dict(strings=False, vm=dict(destroy=-5)), code=-5,
         boxes=[destroyed(-5)], only="wine"),
     Row("runtime-missing", ["-noSplash"], app=dict(runtime="none"), code=-1, boxes=[VM_NOT_LOADED],
-        log=START + END),
+        log=START + END, causes=["libjvm.so: No such file or directory"]),
     Row("runtime-missing-no-strings", ["-noSplash"], app=dict(runtime="none", strings=False), code=-1, boxes=[],
         only="wine"),
     Row("vm-not-created", ["-noSplash"], app=dict(vm=dict(create=-6)), code=-6, boxes=[VM_NOT_CREATED],
         options=["fixed", NO_SPLASH, "folders"], calls=["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1"], only="wine"),
     Row("vm-not-created-no-strings", ["-noSplash"], app=dict(strings=False, vm=dict(create=-6)), code=-3, boxes=[],
         only="wine"),
-    Row("no-entry-point", ["-noSplash"], app=dict(runtime="noentry"), code=-1, boxes=[VM_NOT_CREATED]),
+    Row("no-entry-point", ["-noSplash"], app=dict(runtime="noentry"), code=-1, boxes=[VM_NOT_CREATED],
+        causes=["undefined symbol: JNI_CreateJavaVM"]),
     Row("main-class-missing", ["file.q7"], app=dict(vm=dict(missing_class=MAIN, destroy=3)), code=3, splash=True,
         boxes=[MAIN_NOT_CALLED, destroyed(3)],
         calls=["JNI_CreateJavaVM 0x00010006 ignoreUnrecognized=1", "FindClass java/lang/String",
@@ -77,11 +80,11 @@ ROWS = [
             f"GetStaticMethodID {MAIN} main ([Ljava/lang/String;)V -> null", "DestroyJavaVM"], only="wine"),
     # The real VM's own answers: an empty class path, a main class without main.
     Row("main-class-missing-real-vm", ["file.q7"], app=dict(vm=dict(missing_class=MAIN)), splash=True,
-        boxes=[MAIN_NOT_CALLED, destroyed(0)], vm_loaded=False, only="linux"),
+        boxes=[MAIN_NOT_CALLED, destroyed(0)], vm_loaded=False, causes=["java.lang.NoClassDefFoundError: " + MAIN], only="linux"),
     Row("main-method-missing-real-vm", ["-noSplash"], app=dict(vm=dict(missing_method=1)),
-        boxes=[MAIN_NOT_CALLED, destroyed(0)], only="linux"),
+        boxes=[MAIN_NOT_CALLED, destroyed(0)], causes=[f"java.lang.NoSuchMethodError: static L{MAIN};.main("], only="linux"),
     Row("exception-out-of-main", ["-noSplash"], app=dict(vm=dict(throw=1)), boxes=[destroyed(0)], log=START + END,
-        only="linux"),
+        causes=['Exception in thread "main" java.lang.IllegalStateException: asked to throw'], only="linux"),
     Row("system-exit-in-main", ["-noSplash"], app=dict(vm=dict(exit=42)), code=42, boxes=[], log=START),
     Row("runtime-needs-its-bin-folder", ["-noSplash"], app=dict(runtime="dep"), boxes=[destroyed(0)], only="wine"),
 
@@ -122,7 +125,36 @@ ROWS = [
     Row("started-through-path", ["x"], run=dict(argv0="bare"), options=["fixed", "folders"], main_args=["x"],
         only="linux"),
     Row("headless", ["file.qz57"], app=dict(runtime="none"), run=dict(display=False), code=-1, splash=False,
-        boxes=[VM_NOT_LOADED], only="linux"),
+        boxes=[VM_NOT_LOADED], causes=["No such file"], only="linux"),
+
+    # Linux in hostile surroundings: never silent, never hung, never crashed. The instance lock lives
+    # below the account's home whatever the environment says; a lock folder that cannot be used is
+    # said and the start goes on as the first instance. The VM library is checked before it is
+    # loaded; the VM's own end while it is being created still gets its box; a display that never
+    # answers does not keep a second start from handing over; a settings file that is a FIFO is not
+    # read; closed standard streams do not become the log.
+    Row("lock-folder-not-private", ["x"], run=dict(lock_folder="foreign"), main_args=["x"],
+        causes=["not a folder of this user's own"], only="linux"),
+    Row("lock-folder-a-link", ["x"], run=dict(lock_folder="link"), main_args=["x"], causes=["symbolic link"], only="linux"),
+    Row("descriptor-limit", ["-noSplash"], run=dict(limits=dict(nofile=4), display=False), code=6102, boxes=[LOAD_ERROR],
+        log=START + [(LOAD_ERROR, 1012)], causes=["instance lock", "/proc/self/exe: Too many open files"], only="linux"),
+    Row("hand-off-whatever-the-environment", ["x"], run=dict(lock=True, listener=True, folders={"XDG_RUNTIME_DIR": None, "HOME": None}),
+        boxes=[], received="0078", only="linux"),
+    Row("hand-off-display-not-answering", ["x"], run=dict(lock=True, listener=True, display="silent", timeout=30),
+        received="0078", only="linux"),
+    Row("runtime-truncated", ["-noSplash"], app=dict(runtime="cut:1024"), code=-1, boxes=[VM_NOT_LOADED], causes=["damaged"],
+        only="linux"),
+    Row("runtime-section-headers-cut", ["-noSplash"], app=dict(runtime="cut:-1"), code=-1, boxes=[VM_NOT_LOADED],
+        causes=["damaged"], only="linux"),
+    Row("runtime-a-fifo", ["-noSplash"], app=dict(runtime="fifo"), run=dict(timeout=30), code=-1, boxes=[VM_NOT_LOADED],
+        causes=["not a regular file"], only="linux"),
+    Row("vm-not-created-real-vm", ["-noSplash"], run=dict(env={"JAVA_TOOL_OPTIONS": "-XX:+NoSuchFlag"}), code=-6,
+        boxes=[VM_NOT_CREATED], causes=["JNI error -6"], only="linux"),
+    Row("vm-ends-process-in-creation", ["-noSplash"], run=dict(limits=dict(address_space=300 << 20)), code=1,
+        boxes=[VM_NOT_CREATED], causes=["ended the process while it was being created (exit status 1)"], only="linux"),
+    Row("settings-file-a-fifo", ["-noSplash"], run=dict(settings="fifo", timeout=30), log=START + END, only="linux"),
+    Row("standard-streams-closed", ["-noSplash"], app=dict(vm=dict(say=1)), run=dict(closed=(0, 1, 2), display=False),
+        log=START + END, main_args=["-noSplash"], only="linux"),
 
     # The log.
     Row("log-folder-missing", ["-noSplash"], run=dict(log="nofolder"), log=[], main_args=["-noSplash"]),
@@ -131,9 +163,9 @@ ROWS = [
 
     # Self-protection.
     Row("image-altered", ["-noSplash"], app=dict(altered=True), code=6101, boxes=[LOAD_ERROR], vm_loaded=False,
-        log=START + [(LOAD_ERROR, 1012)]),
+        log=START + [(LOAD_ERROR, 1012)], causes=["altered"]),
     Row("under-debugger", ["-noSplash"], run=dict(debug=True), code=6201, boxes=[LOAD_ERROR], vm_loaded=False,
-        log=START + [("CL interpretation", -767)]),
+        log=START + [("CL interpretation", -767)], causes=["debugger"]),
 
     # A second instance (another holds the lock): hand-off on 6152, nothing else.
     Row("hand-off-no-arguments", run=dict(lock=True, listener=True), boxes=[], vm_loaded=False, log=START,
@@ -200,6 +232,9 @@ def test_row(platform, row):
         assert out.listener.closed_by_sender or out.listener.drop_after
     if "stdout" in want:
         assert out.stdout == want["stdout"]
+    if platform.name.startswith("linux"):
+        causes = want.get("causes", [])
+        assert len(out.causes) == len(causes) and all(c in line for c, line in zip(causes, out.causes)), out.causes
     if out.windows:  # activation: the first ones qualify, the rest are near misses and stay as they were
         raised, missed = out.windows[:platform.raised], out.windows[platform.raised:]
         assert not any(w["iconic"] for w in raised) and raised[1]["zoomed"], "restored only when minimised"

@@ -9,7 +9,7 @@ import java.util.Properties;
 // current directory and behaves as vm-script.txt asks (the line formats are the VM double's, see
 // tests/table/conftest.py). The class path comes first, from its property: the VM keeps that option
 // out of the input arguments it reports.
-//   script keys: main_ms=N  until=NAME  exit=N  throw=1
+//   script keys: main_ms=N  until=NAME  exit=N  throw=1  say=1 (a line on standard output and error)
 public final class ApplicationMainForm {
     public static void main(String[] args) throws Exception {
         Properties script = new Properties();
@@ -21,6 +21,10 @@ public final class ApplicationMainForm {
         for (String option : ManagementFactory.getRuntimeMXBean().getInputArguments()) record.println("option " + option);
         record.println("main " + args.length);
         for (String arg : args) record.println("arg " + arg);
+        if (script.getProperty("say") != null) {
+            System.out.println("said on standard output");
+            System.err.println("said on standard error");
+        }
         long end = System.currentTimeMillis() + Long.parseLong(script.getProperty("main_ms", "0"));
         String until = script.getProperty("until");
         while (System.currentTimeMillis() < end || (until != null && !Files.exists(Paths.get(until)))) Thread.sleep(20);
