@@ -10,9 +10,11 @@
 #include "startup.h"
 
 bool FindLogPath(char16_t* path) {
-    // CSIDL_FLAG_CREATE: the documents folder itself is created when it is missing.
+    // CSIDL_FLAG_CREATE: the documents folder itself is created when it is missing. A failed call may
+    // leave anything in the buffer, so the path is emptied for the log's open to fail on.
     LPWSTR wide = reinterpret_cast<LPWSTR>(path);
     if (FAILED(SHGetFolderPathW(nullptr, CSIDL_PERSONAL | CSIDL_FLAG_CREATE, nullptr, SHGFP_TYPE_CURRENT, wide))) {
+        path[0] = 0;
         return false;
     }
     PathAppendW(wide, L"QZ-LumiscopeQZ-57Nova\\logs\\QZ-LumiscopeQZ-57Nova-L.log");
