@@ -1,19 +1,37 @@
-// Portable part of the single-instance hand-off: the title and class tests of the window search,
-// shared by every platform's window layer.
+// Portable part of the single-instance hand-off: the instance name, the lock's name made of it, and
+// the title and class tests of the window search, shared by every platform's window layer.
 #include "instance.h"
+#include "instance_platform.h"
+
+#include "../text/text.h"
 
 #include <string.h>
 
 namespace {
 
+// The instance name, 8-bit text: the byte string searched for in window titles, and, read as
+// UTF-16, the lock's name. Stored with two zero bytes behind its 18, as it always has been.
+const char InstanceName[20] = "QZ-Lumiscope_QZ-57";
+enum { kInstanceNameBytes = 18 };
+
 // Titles are looked at up to this many UTF-16 units, as the Windows side asks WM_GETTEXT for.
 enum { kTitleUnits = 1024 };
 
-const char16_t kFrameClassName[] = u"" LAUNCHER_FRAME_CLASS_NAME;
+// The running application's frame class, as the class test compares with it.
+const char16_t FrameClassName[] = u"com.qz.kpo.emu57.app.EmulatorFrame";
 // Java's X11 toolkit names a frame's WM_CLASS after the main class, dots turned into dashes.
 const char16_t kJavaToolkitClassName[] = u"com-qz-kpo-emu57-app-ApplicationMainForm";
 
 }  // namespace
+
+// Byte pairs, low byte first, so the name is the same on every host whatever its byte order.
+void FormInstanceLockName(char16_t name[kInstanceLockNameUnits]) {
+    const unsigned char* bytes = reinterpret_cast<const unsigned char*>(InstanceName);
+    for (int i = 0; i < kInstanceNameBytes / 2; ++i) {
+        name[i] = static_cast<char16_t>(bytes[2 * i] | bytes[2 * i + 1] << 8);
+    }
+    name[kInstanceNameBytes / 2] = 0;
+}
 
 bool TitleHoldsInstanceName(const char16_t* title) {
     // Little-endian bytes, written out one by one so the test is the same on every host. The search
@@ -29,6 +47,6 @@ bool TitleHoldsInstanceName(const char16_t* title) {
 }
 
 bool IsFrameClassName(const char16_t* className, bool javaToolkitClass) {
-    if (Utf16CompareNoCase(className, kFrameClassName) == 0) return true;
+    if (Utf16CompareNoCase(className, FrameClassName) == 0) return true;
     return javaToolkitClass && Utf16CompareNoCase(className, kJavaToolkitClassName) == 0;
 }

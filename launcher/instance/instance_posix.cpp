@@ -1,8 +1,10 @@
 // Single-instance hand-off on POSIX systems: the per-user instance lock and the sockets of the
 // argument forwarding. (Raising the running frame is the display's business: instance_x11.cpp.)
 #include "instance.h"
+#include "instance_platform.h"
 
-#include "../core/messages.h"
+#include "../errorbox/errorbox_posix.h"
+#include "../text/text.h"
 
 #include <arpa/inet.h>
 #include <errno.h>
@@ -20,10 +22,6 @@
 #include <unistd.h>
 
 namespace {
-
-int handOffSocket = -1;
-sockaddr_in destination;
-bool destinationKnown = false;
 
 // The lock's folder, below the home of the user's account entry.
 const char kCacheFolder[] = ".cache";
@@ -109,29 +107,36 @@ bool HandOffStart() { return true; }
 
 // "localhost" by name, as on every platform; resolved once. A refused connection leaves a socket
 // that cannot be connected again here, so every attempt has a socket of its own.
-int HandOffConnect() {
-    if (!destinationKnown) {
-        memset(&destination, 0, sizeof destination);
-        destination.sin_family = AF_INET;
-        destination.sin_port = htons(kHandOffPort);
+int HandOffConnect(HandOffLink* link) {
+    sockaddr_in destination;
+    memset(&destination, 0, sizeof destination);
+    destination.sin_family = AF_INET;
+    destination.sin_port = htons(HandOffPort);
+    if (!link->resolved) {
         destination.sin_addr.s_addr = inet_addr("localhost");
         if (destination.sin_addr.s_addr == INADDR_NONE) {
             const hostent* host = gethostbyname("localhost");
             if (host == nullptr || host->h_addrtype != AF_INET || host->h_addr_list[0] == nullptr) return -1;
             memcpy(&destination.sin_addr, host->h_addr_list[0], sizeof destination.sin_addr);
         }
-        destinationKnown = true;
+        link->address = destination.sin_addr.s_addr;
+        link->resolved = true;
     }
-    if (handOffSocket >= 0) close(handOffSocket);
-    handOffSocket = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, IPPROTO_TCP);
-    if (handOffSocket < 0) return -1;
-    return connect(handOffSocket, reinterpret_cast<const sockaddr*>(&destination), sizeof destination) == 0 ? 1 : 0;
+    destination.sin_addr.s_addr = link->address;
+    if (link->socket >= 0) close(static_cast<int>(link->socket));
+    link->socket = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, IPPROTO_TCP);
+    if (link->socket < 0) return -1;
+    return connect(static_cast<int>(link->socket), reinterpret_cast<const sockaddr*>(&destination), sizeof destination) == 0
+               ? 1
+               : 0;
 }
 
 // A listener that went away must not end the second instance with SIGPIPE.
-void HandOffSend(const char* data, size_t bytes) { send(handOffSocket, data, bytes, MSG_NOSIGNAL); }
+void HandOffSend(const HandOffLink& link, const char* data, size_t bytes) {
+    send(static_cast<int>(link.socket), data, bytes, MSG_NOSIGNAL);
+}
 
-void HandOffClose() { close(handOffSocket); }
+void HandOffClose(HandOffLink* link) { close(static_cast<int>(link->socket)); }
 
 void PauseMs(uint32_t ms) {
     timespec rest = {static_cast<time_t>(ms / 1000), static_cast<long>(ms % 1000) * 1000000L};

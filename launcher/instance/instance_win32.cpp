@@ -15,6 +15,9 @@
 #include <wchar.h>
 
 #include "instance.h"
+#include "instance_platform.h"
+
+#include "../text/text_win32.h"
 
 namespace {
 
@@ -23,15 +26,11 @@ namespace {
 const int kTitleUnits = 1024;
 const int kClassUnits = 2048;
 
-SOCKET handOffSocket = INVALID_SOCKET;
-sockaddr_in destination;
-
 }  // namespace
 
-// The lock is an owned mutex whose name the caller passes. The start-up sequence hands over the
-// 8-bit instance name as it is, so the platform sees nine UTF-16 units made of its byte pairs; every
-// instance and every outside probe meets on that name. Any failure, and a name that already exists,
-// mean "another instance runs". The handle is kept open until the process ends, also the one a
+// The lock is an owned mutex whose name the caller passes (the nine-unit name every instance and
+// every outside probe meets on). Any failure, and a name that already exists, mean "another instance
+// runs". The handle is kept open until the process ends, also the one a
 // second instance receives for the existing mutex.
 bool AcquireInstanceLock(const char16_t* name) {
     HANDLE lock = CreateMutexW(nullptr, TRUE, reinterpret_cast<LPCWSTR>(name));
@@ -75,13 +74,15 @@ bool HandOffStart() {
 
 // The socket is made and "localhost" resolved on the first attempt; every attempt reuses both. On
 // the failure paths the socket and Winsock are left to the process end, which follows at once.
-int HandOffConnect() {
-    if (handOffSocket == INVALID_SOCKET) {
-        handOffSocket = socket(AF_INET, SOCK_STREAM, IPPROTO_TCP);
-        if (handOffSocket == INVALID_SOCKET) return -1;
-        memset(&destination, 0, sizeof destination);
-        destination.sin_family = AF_INET;
-        destination.sin_port = htons(kHandOffPort);
+int HandOffConnect(HandOffLink* link) {
+    sockaddr_in destination;
+    memset(&destination, 0, sizeof destination);
+    destination.sin_family = AF_INET;
+    destination.sin_port = htons(HandOffPort);
+    if (link->socket == kNoHandOffSocket) {
+        SOCKET made = socket(AF_INET, SOCK_STREAM, IPPROTO_TCP);
+        if (made == INVALID_SOCKET) return -1;
+        link->socket = static_cast<intptr_t>(made);
         destination.sin_addr.s_addr = inet_addr("localhost");
         if (destination.sin_addr.s_addr == INADDR_NONE) {
             hostent* host = gethostbyname("localhost");
@@ -90,17 +91,22 @@ int HandOffConnect() {
             if (addressBytes > sizeof destination.sin_addr) addressBytes = sizeof destination.sin_addr;
             memcpy(&destination.sin_addr, host->h_addr_list[0], addressBytes);
         }
+        link->address = destination.sin_addr.s_addr;
+        link->resolved = true;
     }
-    return connect(handOffSocket, reinterpret_cast<const sockaddr*>(&destination), sizeof destination) !=
-                   SOCKET_ERROR
+    destination.sin_addr.s_addr = link->address;
+    return connect(static_cast<SOCKET>(link->socket), reinterpret_cast<const sockaddr*>(&destination),
+                   sizeof destination) != SOCKET_ERROR
                ? 1
                : 0;
 }
 
-void HandOffSend(const char* data, size_t bytes) { send(handOffSocket, data, static_cast<int>(bytes), 0); }
+void HandOffSend(const HandOffLink& link, const char* data, size_t bytes) {
+    send(static_cast<SOCKET>(link.socket), data, static_cast<int>(bytes), 0);
+}
 
-void HandOffClose() {
-    closesocket(handOffSocket);
+void HandOffClose(HandOffLink* link) {
+    closesocket(static_cast<SOCKET>(link->socket));
     WSACleanup();
 }
 

@@ -8,8 +8,10 @@
 // connection ends the walk, and a display that does not answer at all (a stopped server, a remote
 // one gone quiet) gets two seconds in all, after which the hand-off goes on without the walk.
 #include "instance.h"
+#include "instance_platform.h"
 
-#include "../core/xconnection_x11.h"
+#include "../text/text.h"
+#include "../x11/xconnection_x11.h"
 
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
@@ -39,13 +41,13 @@ long FirstItem(Display* display, Window window, const char* name, const char* ty
     unsigned long after = 0;
     unsigned char* data = nullptr;
     long item = 0;
-    if (Xlib.XGetWindowProperty(display, window, Xlib.XInternAtom(display, name, False), 0, 1, False,
-                                Xlib.XInternAtom(display, type, False), &actualType, &format, &count, &after,
+    if (gXlib.XGetWindowProperty(display, window, gXlib.XInternAtom(display, name, False), 0, 1, False,
+                                gXlib.XInternAtom(display, type, False), &actualType, &format, &count, &after,
                                 &data) == Success &&
         format == 32 && count > 0) {
         item = reinterpret_cast<long*>(data)[0];
     }
-    if (data != nullptr) Xlib.XFree(data);
+    if (data != nullptr) gXlib.XFree(data);
     return item;
 }
 
@@ -53,16 +55,16 @@ long FirstItem(Display* display, Window window, const char* name, const char* ty
 // UTF8_STRING, STRING (Latin-1, as Java writes WM_NAME) and COMPOUND_TEXT alike.
 char16_t* ReadText(Display* display, Window window, Atom name) {
     XTextProperty property;
-    if (Xlib.XGetTextProperty(display, window, &property, name) == 0) return nullptr;
+    if (gXlib.XGetTextProperty(display, window, &property, name) == 0) return nullptr;
     char** list = nullptr;
     int count = 0;
     char16_t* text = nullptr;
-    if (property.nitems > 0 && Xlib.Xutf8TextPropertyToTextList(display, &property, &list, &count) >= Success &&
+    if (property.nitems > 0 && gXlib.Xutf8TextPropertyToTextList(display, &property, &list, &count) >= Success &&
         count > 0) {
         text = WideCopy(list[0]);
     }
-    if (list != nullptr) Xlib.XFreeStringList(list);
-    Xlib.XFree(property.value);
+    if (list != nullptr) gXlib.XFreeStringList(list);
+    gXlib.XFree(property.value);
     return text;
 }
 
@@ -75,9 +77,9 @@ void ActivateIfFrame(Display* display, Window root, Window window, bool managed)
         if (state != NormalState && state != IconicState) return;
     } else {
         XWindowAttributes attributes;
-        if (Xlib.XGetWindowAttributes(display, window, &attributes) == 0 || attributes.map_state != IsViewable) return;
+        if (gXlib.XGetWindowAttributes(display, window, &attributes) == 0 || attributes.map_state != IsViewable) return;
     }
-    char16_t* title = ReadText(display, window, Xlib.XInternAtom(display, "_NET_WM_NAME", False));
+    char16_t* title = ReadText(display, window, gXlib.XInternAtom(display, "_NET_WM_NAME", False));
     if (title == nullptr || title[0] == 0) {
         free(title);
         title = ReadText(display, window, XA_WM_NAME);
@@ -87,33 +89,33 @@ void ActivateIfFrame(Display* display, Window root, Window window, bool managed)
     if (!named) return;
 
     XClassHint hint = {nullptr, nullptr};
-    if (Xlib.XGetClassHint(display, window, &hint) == 0) return;
+    if (gXlib.XGetClassHint(display, window, &hint) == 0) return;
     char16_t className[kClassUnits + 1];
     size_t n = 0;
     for (const char* c = hint.res_class; c != nullptr && *c != 0 && n < kClassUnits; ++c) {
         className[n++] = static_cast<unsigned char>(*c);  // ICCCM's Latin-1, byte by byte
     }
     className[n] = 0;
-    Xlib.XFree(hint.res_name);
-    Xlib.XFree(hint.res_class);
+    gXlib.XFree(hint.res_name);
+    gXlib.XFree(hint.res_class);
     if (n == 0 || !IsFrameClassName(className, true)) return;
 
     if (!managed) {
-        Xlib.XMapRaised(display, window);
-        Xlib.XSetInputFocus(display, window, RevertToParent, CurrentTime);
+        gXlib.XMapRaised(display, window);
+        gXlib.XSetInputFocus(display, window, RevertToParent, CurrentTime);
         return;
     }
     // Mapping an iconic client window asks the window manager for the normal state (ICCCM 4.1.4);
     // the activation request then deiconifies it too under managers that want it that way.
-    if (state == IconicState) Xlib.XMapWindow(display, window);
+    if (state == IconicState) gXlib.XMapWindow(display, window);
     XEvent event = {};
     event.xclient.type = ClientMessage;
     event.xclient.window = window;
-    event.xclient.message_type = Xlib.XInternAtom(display, "_NET_ACTIVE_WINDOW", False);
+    event.xclient.message_type = gXlib.XInternAtom(display, "_NET_ACTIVE_WINDOW", False);
     event.xclient.format = 32;
     event.xclient.data.l[0] = 2;  // source: a pager, i.e. at the user's request; window managers honour it
     event.xclient.data.l[1] = CurrentTime;
-    Xlib.XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &event);
+    gXlib.XSendEvent(display, root, False, SubstructureRedirectMask | SubstructureNotifyMask, &event);
     // Wait (a little, never for good) until the manager has made it the active window, so that the
     // next window's activation cannot overtake this one and the last one really ends in front.
     for (int i = 0; i < kActivationChecks; ++i) {
@@ -148,7 +150,7 @@ void ActivateOnDisplay() {
     unsigned long count = 0;
     unsigned long after = 0;
     unsigned char* list = nullptr;
-    if (managed && (Xlib.XGetWindowProperty(display, root, Xlib.XInternAtom(display, "_NET_CLIENT_LIST", False), 0,
+    if (managed && (gXlib.XGetWindowProperty(display, root, gXlib.XInternAtom(display, "_NET_CLIENT_LIST", False), 0,
                                             1 << 16, False, XA_WINDOW, &type, &format, &count, &after,
                                             &list) != Success ||
                     format != 32)) {
@@ -159,16 +161,16 @@ void ActivateOnDisplay() {
     if (!managed) {
         Window parent = None;
         unsigned int n = 0;
-        count = Xlib.XQueryTree(display, root, &root, &parent, &children, &n) != 0 ? n : 0;
+        count = gXlib.XQueryTree(display, root, &root, &parent, &children, &n) != 0 ? n : 0;
         windows = children;
     }
     for (unsigned long i = 0; i < count && !connection.lost; ++i) {
         ActivateIfFrame(display, root, windows[i], managed);
-        Xlib.XSync(display, False);  // a vanished window's late errors arrive here, not with the next one
+        gXlib.XSync(display, False);  // a vanished window's late errors arrive here, not with the next one
     }
-    if (list != nullptr) Xlib.XFree(list);
-    if (children != nullptr) Xlib.XFree(children);
-    Xlib.XSync(display, False);
+    if (list != nullptr) gXlib.XFree(list);
+    if (children != nullptr) gXlib.XFree(children);
+    gXlib.XSync(display, False);
     CloseXConnection(&connection);
 }
 

@@ -14,8 +14,14 @@
 
 #include <atomic>
 
-#include "../core/messages.h"
-#include "jvm_internal.h"
+#include "jvm_platform.h"
+
+#include "../errorbox/errorbox.h"
+#include "../errorbox/errorbox_posix.h"
+#include "../folders/folders_posix.h"
+#include "../text/text.h"
+
+const char kDirectorySeparator[] = "/";
 
 namespace {
 
@@ -24,12 +30,12 @@ namespace {
 const char kVmLibrary[] = "jre/lib/server/libjvm.so";
 
 // The settings folder's text; lives until the VM is created.
-char configHome[PATH_MAX];
+char gConfigHome[PATH_MAX];
 
-// The library's own entry point; JvmState holds CreateWatched in its place.
-CreateJavaVmEntry vmEntry = nullptr;
+// The library's own entry point; the VM state holds CreateWatched in its place.
+CreateJavaVmEntry gVmEntry = nullptr;
 // True only while JNI_CreateJavaVM runs (see _exit below).
-std::atomic<bool> vmBeingCreated(false);
+std::atomic<bool> gVmBeingCreated(false);
 
 bool IsDirectory(const char* path) {
     struct stat info;
@@ -77,9 +83,9 @@ const char* DamageOfLibrary(const char* path) {
 // The VM is being created from the time it is called until it returns; a failure is named by its
 // JNI code.
 jint JNICALL CreateWatched(JavaVM** vm, void** env, void* args) {
-    vmBeingCreated = true;
-    jint result = vmEntry(vm, env, args);
-    vmBeingCreated = false;
+    gVmBeingCreated = true;
+    jint result = gVmEntry(vm, env, args);
+    gVmBeingCreated = false;
     static const char* const kJniErrors[] = {"unknown error", "thread detached", "JNI version not supported",
                                              "not enough memory", "a VM exists already", "invalid arguments"};
     if (result != JNI_OK) {
@@ -89,26 +95,9 @@ jint JNICALL CreateWatched(JavaVM** vm, void** env, void* args) {
     return result;
 }
 
-}  // namespace
-
-// HotSpot ends the process itself when it fails during its own start (an address space too small
-// for its heap, say): it prints its reason on standard output and calls _exit(1), which runs no
-// atexit handler, so JNI_CreateJavaVM never returns and the launcher would end without its box. The
-// executable exports this definition (the link's --export-dynamic-symbol=_exit), so the VM library's
-// calls of _exit come here first. While the VM is being created the user gets the "VM not created"
-// box before the process ends with the VM's own code; every other call (a child process between
-// fork and exec among them) ends at once, as the C library's _exit does.
-void _exit(int status) {
-    if (vmBeingCreated.load() && vmBeingCreated.exchange(false)) {
-        ReportCause("the Java VM ended the process while it was being created (exit status %d)", status);
-        char* text = LoadMessageText(kMessageVmNotCreated);
-        if (text != nullptr) ShowErrorBox(text);
-    }
-    for (;;) syscall(SYS_exit_group, status);
-}
-
-Status LoadJvmLibrary(const char* path) {
-    JvmState = VmState();
+// Zeroes `vm` and loads the library at `path`, relative to the current directory.
+Status LoadJvmLibrary(VmState* vm, const char* path) {
+    *vm = VmState();
     if (path == nullptr) return kStatusNotFound;
     char folder[PATH_MAX];
     if (getcwd(folder, sizeof folder) == nullptr) FormatText(folder, sizeof folder, ".");
@@ -123,16 +112,36 @@ Status LoadJvmLibrary(const char* path) {
         return kStatusNotFound;
     }
     // A library without the entry point still counts as loaded; CreateVm reports it.
-    vmEntry = reinterpret_cast<CreateJavaVmEntry>(dlsym(library, "JNI_CreateJavaVM"));
-    if (vmEntry == nullptr) ReportCause("the Java VM in %s cannot be created: %s", folder, dlerror());
-    JvmState.createJavaVm = vmEntry != nullptr ? CreateWatched : nullptr;
+    gVmEntry = reinterpret_cast<CreateJavaVmEntry>(dlsym(library, "JNI_CreateJavaVM"));
+    if (gVmEntry == nullptr) ReportCause("the Java VM in %s cannot be created: %s", folder, dlerror());
+    vm->createJavaVm = gVmEntry != nullptr ? CreateWatched : nullptr;
     return kStatusOk;
 }
 
+}  // namespace
+
+// HotSpot ends the process itself when it fails during its own start (an address space too small
+// for its heap, say): it prints its reason on standard output and calls _exit(1), which runs no
+// atexit handler, so JNI_CreateJavaVM never returns and the launcher would end without its box. The
+// executable exports this definition (the link's --export-dynamic-symbol=_exit), so the VM library's
+// calls of _exit come here first. While the VM is being created the user gets the "VM not created"
+// box before the process ends with the VM's own code; every other call (a child process between
+// fork and exec among them) ends at once, as the C library's _exit does.
+void _exit(int status) {
+    if (gVmBeingCreated.load() && gVmBeingCreated.exchange(false)) {
+        ReportCause("the Java VM ended the process while it was being created (exit status %d)", status);
+        char* text = LoadMessageText(kMessageVmNotCreated);
+        if (text != nullptr) ShowErrorBox(text);
+    }
+    for (;;) syscall(SYS_exit_group, status);
+}
+
+Status LoadPrivateRuntime(VmState* vm) { return LoadJvmLibrary(vm, kVmLibrary); }
+
 // An exception left by the main class's lookup or thrown out of main is described on standard
 // error, as Java's own launcher does ("Exception in thread "main" ..." and its stack trace).
-void DescribeJavaException() {
-    if (JvmState.env != nullptr && JvmState.env->ExceptionCheck()) JvmState.env->ExceptionDescribe();
+void DescribeJavaException(const VmState& vm) {
+    if (vm.env != nullptr && vm.env->ExceptionCheck()) vm.env->ExceptionDescribe();
 }
 
 // The application directory is the directory of the executable file itself, made the current
@@ -143,14 +152,12 @@ char* EnterVmDirectory(const char16_t*) {
     return getcwd(path, sizeof path) != nullptr ? strdup(path) : nullptr;
 }
 
-Status LoadPrivateRuntime() { return LoadJvmLibrary(kVmLibrary); }
-
 // The per-user settings folder when it exists as a directory; the temp-path option is gated by the
 // first system settings folder ($XDG_CONFIG_DIRS, /etc/xdg when unset or empty) and carries the
 // per-user folder, as the all-users folder gates it on Windows.
 void FindSettingsFolders(VmOptionInputs* inputs) {
-    inputs->userAppDataFound = FindConfigHome(configHome, sizeof configHome) && IsDirectory(configHome);
-    inputs->userAppData = configHome;
+    inputs->userAppDataFound = FindConfigHome(gConfigHome, sizeof gConfigHome) && IsDirectory(gConfigHome);
+    inputs->userAppData = gConfigHome;
 
     char systemConfig[PATH_MAX];
     const char* dirs = getenv("XDG_CONFIG_DIRS");

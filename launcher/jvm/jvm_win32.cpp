@@ -5,7 +5,9 @@
 #include <shlwapi.h>
 #include <stdlib.h>
 
-#include "jvm_internal.h"
+#include "jvm_platform.h"
+
+#include "../text/text.h"
 
 namespace {
 
@@ -27,23 +29,35 @@ static_assert(SameType<decltype(JNINativeInterface_::FindClass), jclass(__stdcal
 
 const char kVmLibrary[] = "jre\\bin\\client\\jvm.dll";
 
+enum { kFolderPathUnits = 260 };
 // The per-user folder, narrowed byte by byte; lives until the VM is created.
-char userAppDataNarrow[kFolderPathUnits + 1];
+char gUserAppDataNarrow[kFolderPathUnits + 1];
 
-}  // namespace
+// The special-folder paths reach the VM as the low 8 bits of each of the buffer's 260 units, with
+// no code-page conversion: characters above U+00FF arrive altered, and one whose low byte is zero
+// ends the text there. `out` holds kFolderPathUnits + 1 bytes and is always terminated.
+void NarrowLowBytes(const char16_t* folder, char* out) {
+    for (int i = 0; i < kFolderPathUnits; ++i) out[i] = static_cast<char>(folder[i] & 0xFF);
+    out[kFolderPathUnits] = 0;
+}
 
-Status LoadJvmLibrary(const char* path) {
-    JvmState = VmState();
+// Zeroes `vm` and loads the library at `path`, relative to the current directory.
+Status LoadJvmLibrary(VmState* vm, const char* path) {
+    *vm = VmState();
     char16_t* widePath = WideCopy(path);
     if (widePath == nullptr) return kStatusNotFound;
     HMODULE library = LoadLibraryW(reinterpret_cast<LPCWSTR>(widePath));
     free(widePath);
     if (library == nullptr) return kStatusNotFound;
     // A library without the entry point still counts as loaded; CreateVm reports it.
-    JvmState.createJavaVm =
+    vm->createJavaVm =
         reinterpret_cast<CreateJavaVmEntry>(reinterpret_cast<void*>(GetProcAddress(library, "JNI_CreateJavaVM")));
     return kStatusOk;
 }
+
+}  // namespace
+
+const char kDirectorySeparator[] = "\\";
 
 // The directory of argv[0] as typed, made the current directory for good; from here on it is the
 // current directory as re-read (normally without trailing backslash).
@@ -63,21 +77,21 @@ char* EnterVmDirectory(const char16_t* argv0) {
 // While a DLL folder is set the current directory leaves the search, so when that hides the
 // library (argv[0] naming another directory than the program file's), the plain search is tried
 // once more.
-Status LoadPrivateRuntime() {
+Status LoadPrivateRuntime(VmState* vm) {
     WCHAR current[MAX_PATH];
     WCHAR runtimeBin[MAX_PATH];
     bool dllDirectorySet = GetCurrentDirectoryW(MAX_PATH, current) != 0 &&
                            PathCombineW(runtimeBin, current, L"jre\\bin") != nullptr &&
                            SetDllDirectoryW(runtimeBin) != FALSE;
-    Status loaded = LoadJvmLibrary(kVmLibrary);
+    Status loaded = LoadJvmLibrary(vm, kVmLibrary);
     if (loaded != kStatusOk && dllDirectorySet) {
         SetDllDirectoryW(nullptr);
-        loaded = LoadJvmLibrary(kVmLibrary);
+        loaded = LoadJvmLibrary(vm, kVmLibrary);
     }
     return loaded;
 }
 
-void DescribeJavaException() {}
+void DescribeJavaException(const VmState&) {}
 
 // Both folder queries without creating anything; a failed query only drops its option. The
 // per-user path reaches the VM as the low byte of each of its 260 units, on purpose.
@@ -86,6 +100,6 @@ void FindSettingsFolders(VmOptionInputs* inputs) {
     WCHAR commonAppData[MAX_PATH] = {0};
     inputs->userAppDataFound = SHGetSpecialFolderPathW(nullptr, userAppData, CSIDL_APPDATA, FALSE) != FALSE;
     inputs->commonAppDataFound = SHGetSpecialFolderPathW(nullptr, commonAppData, CSIDL_COMMON_APPDATA, FALSE) != FALSE;
-    NarrowLowBytes(reinterpret_cast<const char16_t*>(userAppData), userAppDataNarrow);
-    inputs->userAppData = userAppDataNarrow;
+    NarrowLowBytes(reinterpret_cast<const char16_t*>(userAppData), gUserAppDataNarrow);
+    inputs->userAppData = gUserAppDataNarrow;
 }

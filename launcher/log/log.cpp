@@ -1,5 +1,9 @@
-// Diagnostic log: line layout and levels. The file itself is reached through LogPlatform*.
+// Diagnostic log: line layout and levels. The file itself is reached through LogPlatform*
+// (log_platform.h).
 #include "log.h"
+#include "log_platform.h"
+
+#include "../text/text.h"
 
 #include <stdio.h>
 #include <stdlib.h>
@@ -8,11 +12,13 @@
 
 namespace {
 
-LogHandle g_handle = 0;          // 0: never opened; otherwise what the platform's open returned
-const int32_t g_threshold = 0;   // lowest level written; nothing in the launcher changes it
-uint32_t g_lastRequest = 0;      // bookkeeping of the piece writer, kept for inspection in a debugger
-uint32_t g_lastWritten = 0;
-uint32_t g_lastResult = 0;
+LogHandle gLogHandle = 0;         // 0: never opened; otherwise what the platform's open returned
+const int32_t kLogThreshold = 0;  // lowest level written; nothing in the launcher changes it
+// The piece writer's bookkeeping: the bytes asked for, the bytes written and the result of the last
+// write. Nothing reads them; they are kept as the log has always kept them, for a debugger to see.
+uint32_t gLastRequest = 0;
+uint32_t gLastWritten = 0;
+uint32_t gLastResult = 0;
 
 const char16_t kSeparator[] = u" : ";
 const char16_t kLineEnd[] = u"\r\n";
@@ -23,10 +29,10 @@ int WritePiece(const char16_t* piece) {
     uint32_t bytes = static_cast<uint32_t>(Utf16Length(piece) * sizeof(char16_t));
     uint32_t written = 0;
     uint32_t error = 0;
-    g_lastRequest = bytes;
-    bool ok = LogPlatformWrite(g_handle, piece, bytes, &written, &error);
-    g_lastWritten = written;
-    g_lastResult = ok ? 1 : 0;
+    gLastRequest = bytes;
+    bool ok = LogPlatformWrite(gLogHandle, piece, bytes, &written, &error);
+    gLastWritten = written;
+    gLastResult = ok ? 1 : 0;
     if (!ok) {
         LogPlatformWriteFailed(error);
         return 5;
@@ -34,32 +40,32 @@ int WritePiece(const char16_t* piece) {
     return 0;
 }
 
-// Narrow text back to UTF-16 as the log has always done it: ask for the count (terminator
-// included), take count + 1 units, convert count + 1 bytes of the source. The source buffers are
-// zero-filled one byte past their text, so the extra byte converts to a second terminator.
-const char16_t* WidenForLog(const char* text) {
-    int count = WideSize(text);
-    if (count <= 0) return u"";
-    char16_t* wide = static_cast<char16_t*>(malloc((static_cast<size_t>(count) + 1) * sizeof(char16_t)));
-    if (wide == nullptr) return u"";
-    if (ToWide(text, count + 1, wide, count + 1) == 0) return u"";
-    return wide;
-}
-
-}  // namespace
-
+// tag " : " message CR LF.
 void LogWriteText(int32_t level, const char16_t* tag, const char16_t* message) {
-    if (g_handle == 0) return;
-    if (level < g_threshold) return;
+    if (gLogHandle == 0) return;
+    if (level < kLogThreshold) return;
     WritePiece(tag);
     WritePiece(kSeparator);
     WritePiece(message);
     WritePiece(kLineEnd);
 }
 
+}  // namespace
+
+// Ask for the count (terminator included), take count + 1 units, and convert as many bytes of the
+// source as the platform's rule says.
+const char16_t* WidenForLog(const char* text) {
+    int count = WideSize(text);
+    if (count <= 0) return u"";
+    char16_t* wide = static_cast<char16_t*>(malloc((static_cast<size_t>(count) + 1) * sizeof(char16_t)));
+    if (wide == nullptr) return u"";
+    if (ToWide(text, LogPlatformWidenBytes(text, count), wide, count + 1) == 0) return u"";
+    return wide;
+}
+
 void LogWrite(int32_t level, const char16_t* tag, const char16_t* message, int32_t code) {
-    if (g_handle == 0) return;
-    if (level < g_threshold) return;
+    if (gLogHandle == 0) return;
+    if (level < kLogThreshold) return;
     // The message goes through the narrow code page and back on purpose: characters the code page
     // lacks arrive as its default character, as in every log this launcher has written.
     const char* narrow = NarrowCopy(message);
@@ -73,9 +79,9 @@ void LogWrite(int32_t level, const char16_t* tag, const char16_t* message, int32
 }
 
 void LogOpen(const char16_t* path) {
-    if (g_handle != 0) return;
-    g_handle = LogPlatformOpen(path);
-    if (g_handle == kLogInvalidHandle || g_handle == 0) return;
+    if (gLogHandle != 0) return;
+    gLogHandle = LogPlatformOpen(path);
+    if (gLogHandle == kLogInvalidHandle || gLogHandle == 0) return;
 
     // The C runtime's asctime layout with a zero-padded day, English names, and its line feed,
     // which stays in front of the line's own CR LF.
@@ -94,12 +100,12 @@ void LogOpen(const char16_t* path) {
 }
 
 void LogClose() {
-    if (g_handle == 0) return;
-    if (g_threshold <= 0) {
+    if (gLogHandle == 0) return;
+    if (kLogThreshold <= 0) {
         WritePiece(u"Ended logging...");
         WritePiece(kSeparator);
         WritePiece(u"");
         WritePiece(kLineEnd);
     }
-    LogPlatformClose(g_handle);
+    LogPlatformClose(gLogHandle);
 }

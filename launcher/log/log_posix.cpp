@@ -2,7 +2,9 @@
 // instance's log: the file is opened without truncation, locked exclusively (the lock lasts as long
 // as the descriptor, so a crashed instance leaves none behind), and only then emptied. A file that
 // another instance holds counts as an open that failed.
-#include "log.h"
+#include "log_platform.h"
+
+#include "../text/text.h"
 
 #include <errno.h>
 #include <fcntl.h>
@@ -40,3 +42,5 @@ void LogPlatformClose(LogHandle handle) {
 }
 
 void LogPlatformWriteFailed(uint32_t) {}
+
+int LogPlatformWidenBytes(const char*, int units) { return units + 1; }

@@ -1,6 +1,8 @@
 // The log file on Windows: read/write, shared for reading only (a second launcher cannot write
 // into a running instance's log), always recreated.
-#include "log.h"
+#include "log_platform.h"
+
+#include "../text/text_win32.h"
 
 #include <windows.h>
 
@@ -21,3 +23,5 @@ bool LogPlatformWrite(LogHandle handle, const void* data, uint32_t bytes, uint32
 void LogPlatformClose(LogHandle handle) { CloseHandle(reinterpret_cast<HANDLE>(handle)); }
 
 void LogPlatformWriteFailed(uint32_t error) { PrintText("WriteFile failed with error %d.\n", static_cast<int>(error)); }
+
+int LogPlatformWidenBytes(const char*, int units) { return units + 1; }

@@ -1,6 +1,6 @@
 // The checksum of the first self-protection check, over a file held in memory. The build stamps
-// the same value into the file after linking (tools/stamp_checksum.py).
-#include "protection.h"
+// the same value into the file after linking (stamp_checksum.py).
+#include "protection_platform.h"
 
 namespace {
 
@@ -16,8 +16,8 @@ const uint32_t kChecksumInOptionalHeader = 64;  // the same in PE32 and PE32+
 const uint32_t kPe32Magic = 0x10B;
 const uint32_t kPe32PlusMagic = 0x20B;
 
-}  // namespace
-
+// The image checksum field of a PE file held in memory: its byte offset. False when the bytes are not
+// a PE image or the header does not fit in `length`.
 bool FindImageChecksumField(const uint8_t* image, uint32_t length, uint32_t* fieldOffset) {
     if (length < kDosHeaderSize || image[0] != 'M' || image[1] != 'Z') return false;
     const uint32_t pe = ReadU32(image + kPeHeaderOffsetField);
@@ -47,6 +47,8 @@ uint32_t ComputeImageChecksum(const uint8_t* image, uint32_t length, uint32_t fi
     while (sum > 0xFFFF) sum = (sum & 0xFFFF) + (sum >> 16);
     return static_cast<uint32_t>(sum) + length;
 }
+
+}  // namespace
 
 Status VerifyImageChecksum(const uint8_t* image, uint32_t length) {
     uint32_t field = 0;

@@ -2,10 +2,11 @@
 // against the checksum stamped into it after linking, and the kernel's word on a tracer.
 //
 // The stamp lives in the data of the executable: a marker the build looks for, then four bytes
-// that tools/stamp_checksum.py fills with the file's checksum (those four bytes counted as zero).
+// that stamp_checksum.py fills with the file's checksum (those four bytes counted as zero).
 #include "protection.h"
+#include "protection_platform.h"
 
-#include "../core/messages.h"
+#include "../errorbox/errorbox_posix.h"
 
 #include <errno.h>
 #include <fcntl.h>
@@ -22,7 +23,7 @@ namespace {
 
 const size_t kMarkerBytes = 12;
 // Not const: the compiler must keep the bytes in the file, and the check reads them at run time.
-unsigned char imageStamp[kMarkerBytes + 4] = {'Q', 'Z', '5', '7', '-', 'S', 'T', 'A', 'M', 'P', '-', '1', 0, 0, 0, 0};
+unsigned char gImageStamp[kMarkerBytes + 4] = {'Q', 'Z', '5', '7', '-', 'S', 'T', 'A', 'M', 'P', '-', '1', 0, 0, 0, 0};
 
 const off_t kLargestImage = 64l << 20;
 
@@ -44,8 +45,8 @@ Status ProtectionCheckImage() {
         void* view = mmap(nullptr, size, PROT_READ, MAP_PRIVATE | MAP_POPULATE, file, 0);
         if (view != MAP_FAILED) {
             const uint8_t* image = static_cast<const uint8_t*>(view);
-            // The marker appears once in the file: in the data of imageStamp itself.
-            const uint8_t* marker = static_cast<const uint8_t*>(memmem(image, size, imageStamp, kMarkerBytes));
+            // The marker appears once in the file: in the data of gImageStamp itself.
+            const uint8_t* marker = static_cast<const uint8_t*>(memmem(image, size, gImageStamp, kMarkerBytes));
             if (marker != nullptr) {
                 result = VerifyStampedChecksum(image, static_cast<uint32_t>(size),
                                                static_cast<uint32_t>(marker - image + kMarkerBytes));

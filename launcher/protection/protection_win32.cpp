@@ -1,6 +1,7 @@
 // Self-protection checks on Windows: our own executable file read through a mapped view, and the
 // two ways the system tells a process that it is being debugged.
 #include "protection.h"
+#include "protection_platform.h"
 
 #include <windows.h>
 

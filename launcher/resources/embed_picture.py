@@ -15,7 +15,7 @@ def main(argv):
     rows = ",\n".join(",".join(str(b) for b in data[i:i + 32]) for i in range(0, len(data), 32))
     with open(argv[3], "w") as out:
         out.write('// Generated from %s by embed_picture.py; do not edit.\n' % argv[1].rsplit("/", 1)[-1])
-        out.write('#include "splash/splash.h"\n#include <string.h>\n\n')
+        out.write('#include "splash/splash_platform.h"\n#include <string.h>\n\n')
         out.write("namespace {\nconst uint8_t kPicture[] = {\n%s};\n}  // namespace\n\n" % rows)
         out.write("bool FindLinkedSplashPicture(const char* name, const uint8_t** data, size_t* size) {\n")
         out.write('    if (name == nullptr || strcmp(name, "%s") != 0) return false;\n' % argv[2])

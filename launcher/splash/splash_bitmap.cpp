@@ -6,7 +6,7 @@
 // alone; bfOffBits and biClrUsed are ignored on purpose, so a palette picture has to carry its full
 // table. The resource is our own, but it is still checked against its size: a file image too short
 // for the headers, or for the table and rows that the drawing would read, is treated as absent.
-#include "splash.h"
+#include "splash_platform.h"
 
 namespace {
 

@@ -9,6 +9,10 @@
 // Every failure is silent. A missing or unreadable picture ends the thread before any window exists,
 // and the launch goes on unchanged.
 #include "splash.h"
+#include "splash_platform.h"
+
+#include "../core/core.h"
+#include "../text/text.h"
 
 #include <windows.h>
 #include <vfw.h>
@@ -38,7 +42,8 @@ HWND volatile gSplashWindow = nullptr;
 int gFadeAlpha = kSplashFirstAlpha;
 HMODULE gUser32 = nullptr;
 SetLayeredWindowAttributesProc gSetLayeredWindowAttributes = nullptr;
-UINT_PTR gFadeTimer = 0;  // kept as returned, not used
+// What setting the fade timer returned. Nothing reads it; it is kept as the splash has always kept it.
+UINT_PTR gFadeTimer = 0;
 
 // DrawDib lives in msvfw32, which brings libraries of its own (under Wine winmm, msacm32, ole32,
 // combase and rpcrt4: WinMain came about 60 ms later, measured). Only the splash draws with it, so
@@ -149,7 +154,54 @@ LRESULT CALLBACK SplashWndProc(HWND window, UINT message, WPARAM wParam, LPARAM 
     }
 }
 
-// The splash thread: owns the parameter copy, the DrawDib handle and the window.
+// The window class, registered once per instance and never unregistered; false when it cannot be.
+bool RegisterSplashClass(HINSTANCE instance) {
+    WNDCLASSEXW windowClass;
+    if (GetClassInfoExW(instance, kClassName, &windowClass)) return true;
+    ZeroMemory(&windowClass, sizeof windowClass);
+    windowClass.cbSize = sizeof windowClass;
+    windowClass.lpfnWndProc = SplashWndProc;
+    windowClass.hInstance = instance;
+    windowClass.hCursor = LoadCursorW(nullptr, reinterpret_cast<LPCWSTR>(IDC_ARROW));
+    windowClass.lpszClassName = kClassName;
+    return RegisterClassExW(&windowClass) != 0;
+}
+
+// The window, created hidden, exactly the picture's size, where the parameters place it, off the
+// taskbar, at opacity 64 before it is ever shown (never 0). The result is not checked.
+HWND CreateSplashWindow(HINSTANCE instance, const SplashParams& params, int32_t width, int32_t height) {
+    // Signed divisions, rounding toward zero, as the position rule says.
+    int x;
+    int y;
+    if (params.centerOnScreen != 0) {
+        x = (GetSystemMetrics(SM_CXSCREEN) - width) / 2;
+        y = (GetSystemMetrics(SM_CYSCREEN) - height) / 2;
+    } else {
+        x = params.centerX - width / 2;
+        y = params.centerY - height / 2;
+    }
+    DWORD exStyle = WS_EX_LAYERED | WS_EX_TOOLWINDOW;  // off the taskbar
+    if (params.topMost != 0) exStyle |= WS_EX_TOPMOST;
+    HWND window = CreateWindowExW(exStyle, kClassName, L"", WS_POPUP, x, y, width, height, nullptr, nullptr, instance,
+                                  nullptr);
+    SplashFadeStep(window);
+    return window;
+}
+
+// Starts the display time (fade included) and the fade, and shows the window; a window whose display
+// timer cannot be set closes without ever being shown.
+void ShowSplashWindow(HWND window, uint16_t displayMs) {
+    UINT_PTR closeTimer = SetTimer(window, kCloseTimer, displayMs, nullptr);
+    gFadeTimer = SetTimer(window, kFadeTimer, kSplashFadeIntervalMs, nullptr);
+    if (closeTimer != 0) {
+        ShowWindow(window, SW_SHOW);
+    } else {
+        PostMessageW(window, WM_CLOSE, 0, 0);
+    }
+}
+
+// The splash thread: owns the parameter copy, the DrawDib handle and the window, and runs the
+// window's messages until it is destroyed.
 DWORD WINAPI SplashThreadProc(LPVOID parameter) {
     SplashParams* params = static_cast<SplashParams*>(parameter);
     // The window class, the window and the picture all belong to the launcher's own module.
@@ -161,69 +213,18 @@ DWORD WINAPI SplashThreadProc(LPVOID parameter) {
         GlobalFree(params);
         return 0;
     }
-    int32_t width = 0;
-    int32_t height = 0;
-    DWORD bytes = 0;
-    HGLOBAL bitmap =
-        LoadSplashBitmap(instance, params->resourceName, &width, &height, &bytes);
-    const uint8_t* bitmapFile = bitmap != nullptr ? static_cast<const uint8_t*>(LockResource(bitmap)) : nullptr;
-    if (bitmapFile == nullptr) {
+    SplashWindowData data = {drawDib, nullptr, 0, 0, 0};
+    HGLOBAL bitmap = LoadSplashBitmap(instance, params->resourceName, &data.width, &data.height, &data.bitmapBytes);
+    data.bitmapFile = bitmap != nullptr ? static_cast<const uint8_t*>(LockResource(bitmap)) : nullptr;
+    if (data.bitmapFile == nullptr || !RegisterSplashClass(instance)) {
         gDrawDibClose(drawDib);
         GlobalFree(params);
         return 0;
     }
 
-    // Registered once per instance and never unregistered.
-    WNDCLASSEXW windowClass;
-    if (!GetClassInfoExW(instance, kClassName, &windowClass)) {
-        ZeroMemory(&windowClass, sizeof windowClass);
-        windowClass.cbSize = sizeof windowClass;
-        windowClass.lpfnWndProc = SplashWndProc;
-        windowClass.hInstance = instance;
-        windowClass.hCursor = LoadCursorW(nullptr, reinterpret_cast<LPCWSTR>(IDC_ARROW));
-        windowClass.lpszClassName = kClassName;
-        if (RegisterClassExW(&windowClass) == 0) {
-            gDrawDibClose(drawDib);
-            GlobalFree(params);
-            return 0;
-        }
-    }
-
-    // Signed divisions, rounding toward zero, as the position rule says.
-    int x;
-    int y;
-    if (params->centerOnScreen != 0) {
-        x = (GetSystemMetrics(SM_CXSCREEN) - width) / 2;
-        y = (GetSystemMetrics(SM_CYSCREEN) - height) / 2;
-    } else {
-        x = params->centerX - width / 2;
-        y = params->centerY - height / 2;
-    }
-    DWORD exStyle = WS_EX_LAYERED | WS_EX_TOOLWINDOW;  // off the taskbar
-    if (params->topMost != 0) exStyle |= WS_EX_TOPMOST;
-
-    // Created hidden, exactly the picture's size. The result is not checked.
-    HWND window = CreateWindowExW(exStyle, kClassName, L"", WS_POPUP, x, y, width, height,
-                                  nullptr, nullptr, instance, nullptr);
-    // Opacity 64 before the window is ever shown, never 0.
-    SplashFadeStep(window);
-
-    SplashWindowData data;
-    data.drawDib = drawDib;
-    data.bitmapFile = bitmapFile;
-    data.bitmapBytes = bytes;
-    data.width = width;
-    data.height = height;
+    HWND window = CreateSplashWindow(instance, *params, data.width, data.height);
     SetWindowLongPtrW(window, GWLP_USERDATA, reinterpret_cast<LONG_PTR>(&data));
-
-    // The display time counts from here, fade included.
-    UINT_PTR closeTimer = SetTimer(window, kCloseTimer, params->displayMs, nullptr);
-    gFadeTimer = SetTimer(window, kFadeTimer, kSplashFadeIntervalMs, nullptr);
-    if (closeTimer != 0) {
-        ShowWindow(window, SW_SHOW);
-    } else {
-        PostMessageW(window, WM_CLOSE, 0, 0);  // closes without ever being shown
-    }
+    ShowSplashWindow(window, params->displayMs);
     gSplashWindow = window;
 
     MSG message;

@@ -11,8 +11,9 @@
 // Every failure is silent: no display, a picture the reader rejects, a visual we cannot fill or any
 // X error means no splash, and the launch goes on.
 #include "splash.h"
+#include "splash_platform.h"
 
-#include "../core/xconnection_x11.h"
+#include "../x11/xconnection_x11.h"
 
 #include <X11/Xatom.h>
 #include <X11/Xlib.h>
@@ -54,7 +55,7 @@ int64_t NowMs() {
 
 void SetOpacity(Display* display, Window window, Atom opacity, int alpha) {
     unsigned long value = static_cast<unsigned long>(alpha) * 0x01010101ul;
-    Xlib.XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
+    gXlib.XChangeProperty(display, window, opacity, XA_CARDINAL, 32, PropModeReplace,
                          reinterpret_cast<unsigned char*>(&value), 1);
 }
 
@@ -86,7 +87,7 @@ XImage* MakeSplashImage(Display* display, const uint8_t* data, size_t size, cons
         if (depth == 32) {
             for (size_t i = 0; i < count; ++i) pixels[i] |= 0xFF000000u;  // opaque in an alpha visual
         }
-        image = Xlib.XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0, static_cast<char*>(mapped),
+        image = gXlib.XCreateImage(display, visual, static_cast<unsigned>(depth), ZPixmap, 0, static_cast<char*>(mapped),
                                   static_cast<unsigned>(info.width), static_cast<unsigned>(info.height), 32, 0);
     }
     if (image == nullptr || image->bits_per_pixel != 32) {
@@ -133,7 +134,7 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
     }
     XSetWindowAttributes attributes;
     attributes.event_mask = ExposureMask;
-    Window window = Xlib.XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
+    Window window = gXlib.XCreateWindow(display, RootWindow(display, screen), x, y, static_cast<unsigned>(info.width),
                                        static_cast<unsigned>(info.height), 0, CopyFromParent, InputOutput,
                                        CopyFromParent, CWEventMask, &attributes);
 
@@ -143,24 +144,24 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
     size.y = y;
     size.min_width = size.max_width = info.width;
     size.min_height = size.max_height = info.height;
-    Xlib.XSetWMNormalHints(display, window, &size);
+    gXlib.XSetWMNormalHints(display, window, &size);
     XWMHints hints;
     hints.flags = InputHint;
     hints.input = False;  // never takes the keyboard
-    Xlib.XSetWMHints(display, window, &hints);
+    gXlib.XSetWMHints(display, window, &hints);
 
     enum { kType, kSplash, kState, kSkipTaskbar, kSkipPager, kMotif, kOpacity, kAtoms };
     static const char* const kNames[kAtoms] = {"_NET_WM_WINDOW_TYPE", "_NET_WM_WINDOW_TYPE_SPLASH", "_NET_WM_STATE",
                                                "_NET_WM_STATE_SKIP_TASKBAR", "_NET_WM_STATE_SKIP_PAGER",
                                                "_MOTIF_WM_HINTS", "_NET_WM_WINDOW_OPACITY"};
     Atom atoms[kAtoms] = {};
-    Xlib.XInternAtoms(display, const_cast<char**>(kNames), kAtoms, False, atoms);
-    Xlib.XChangeProperty(display, window, atoms[kType], XA_ATOM, 32, PropModeReplace,
+    gXlib.XInternAtoms(display, const_cast<char**>(kNames), kAtoms, False, atoms);
+    gXlib.XChangeProperty(display, window, atoms[kType], XA_ATOM, 32, PropModeReplace,
                          reinterpret_cast<unsigned char*>(&atoms[kSplash]), 1);
-    Xlib.XChangeProperty(display, window, atoms[kState], XA_ATOM, 32, PropModeReplace,
+    gXlib.XChangeProperty(display, window, atoms[kState], XA_ATOM, 32, PropModeReplace,
                          reinterpret_cast<unsigned char*>(&atoms[kSkipTaskbar]), 2);
     long motif[5] = {2, 0, 0, 0, 0};  // flags: decorations given; decorations: none
-    Xlib.XChangeProperty(display, window, atoms[kMotif], atoms[kMotif], 32, PropModeReplace,
+    gXlib.XChangeProperty(display, window, atoms[kMotif], atoms[kMotif], 32, PropModeReplace,
                          reinterpret_cast<unsigned char*>(motif), 5);
     *opacity = atoms[kOpacity];
     SetOpacity(display, window, *opacity, SplashFadeNext(&gFadeAlpha));
@@ -169,7 +170,7 @@ Window CreateSplashWindow(Display* display, const SplashParams& params, const Sp
 
 // Shows the window until its time is up, the wake-up pipe is written or the connection fails.
 void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity, int64_t closeAt) {
-    GC gc = Xlib.XCreateGC(display, window, 0, nullptr);
+    GC gc = gXlib.XCreateGC(display, window, 0, nullptr);
     int64_t nextFade = NowMs() + kSplashFadeIntervalMs;
     bool fading = true;
     for (;;) {
@@ -181,23 +182,23 @@ void RunSplashLoop(Display* display, Window window, XImage* image, Atom opacity,
             else SetOpacity(display, window, opacity, alpha);
             nextFade = now + kSplashFadeIntervalMs;
         }
-        while (!XFailed() && Xlib.XPending(display) > 0) {  // XPending also sends what is queued
+        while (!XFailed() && gXlib.XPending(display) > 0) {  // XPending also sends what is queued
             XEvent event;
-            Xlib.XNextEvent(display, &event);
+            gXlib.XNextEvent(display, &event);
             if (event.type == Expose && image != nullptr) {
-                Xlib.XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
+                gXlib.XPutImage(display, window, gc, image, event.xexpose.x, event.xexpose.y, event.xexpose.x,
                                event.xexpose.y, static_cast<unsigned>(event.xexpose.width),
                                static_cast<unsigned>(event.xexpose.height));
             }
         }
-        Xlib.XFlush(display);
+        gXlib.XFlush(display);
         if (XFailed()) break;
         int64_t wakeAt = fading && nextFade < closeAt ? nextFade : closeAt;
         pollfd fds[2] = {{ConnectionNumber(display), POLLIN, 0}, {gWakePipe[0], POLLIN, 0}};
         int timeout = static_cast<int>(wakeAt - NowMs());
         if (poll(fds, 2, timeout < 0 ? 0 : timeout) > 0 && fds[1].revents != 0) break;
     }
-    Xlib.XFreeGC(display, gc);
+    gXlib.XFreeGC(display, gc);
 }
 
 // The splash thread's work from the picture to the destroyed window.
@@ -227,19 +228,19 @@ void ShowSplash(const SplashParams& params) {
     if (!XFailed() && gState.compare_exchange_strong(expected, kShowing)) {
         // Waits until the server has mapped it: decoding at once would take a processor from the
         // server while the VM loads on the other one.
-        Xlib.XMapWindow(display, window);
-        Xlib.XSync(display, False);
+        gXlib.XMapWindow(display, window);
+        gXlib.XSync(display, False);
         XImage* image = MakeSplashImage(display, data, size, info);
         if (image == nullptr) {  // a picture the reader cannot draw: a black window
-            Xlib.XSetWindowBackground(display, window, BlackPixel(display, DefaultScreen(display)));
-            Xlib.XClearWindow(display, window);
+            gXlib.XSetWindowBackground(display, window, BlackPixel(display, DefaultScreen(display)));
+            gXlib.XClearWindow(display, window);
         }
         RunSplashLoop(display, window, image, opacity, closeAt);
-        Xlib.XUnmapWindow(display, window);
+        gXlib.XUnmapWindow(display, window);
         if (image != nullptr) DestroySplashImage(image);
     }
-    Xlib.XDestroyWindow(display, window);
-    Xlib.XSync(display, False);
+    gXlib.XDestroyWindow(display, window);
+    gXlib.XSync(display, False);
     CloseXConnection(&gConnection);
 }
 
@@ -261,7 +262,7 @@ void JoinSplashThread() {
 
 void SplashStart(const SplashParams* params) {
     if (gState != 0) return;  // one splash per process
-    // Without a display there is nothing to show: no thread, no Xlib. libX11 is loaded here, on the
+    // Without a display there is nothing to show: no thread, no gXlib. libX11 is loaded here, on the
     // main thread, rather than on the splash thread, where its loading could wait behind the VM's.
     if (!LoadXlib()) return;
     if (pipe2(gWakePipe, O_CLOEXEC | O_NONBLOCK) != 0) return;

@@ -4,13 +4,15 @@
 // (startup_win32.cpp, startup_posix.cpp) provides the entry point, the documents folder, the
 // command line and the application directory.
 #include "startup.h"
+#include "startup_platform.h"
 
-#include "../core/messages.h"
+#include "../errorbox/errorbox.h"
 #include "../instance/instance.h"
 #include "../jvm/jvm.h"
 #include "../log/log.h"
 #include "../protection/protection.h"
 #include "../splash/splash.h"
+#include "../text/text.h"
 
 #include <stdlib.h>
 
@@ -21,17 +23,11 @@ const char kCommandLine[] = "CL interpretation";
 const char kLoadError[] = "Unexpected Error. Error loading files.";
 const char kLaunchEnd[] = "Successful launch end.";
 
-// Each log line of the start-up sequence is written from the narrow stage text and ModuleName,
-// both widened afresh for the call: count n with the terminator, n + 1 units, n + 1 bytes converted
-// (both sources are zero-filled past their text). The copies are not released.
-const char16_t* WidenForLog(const char* text) {
-    int n = WideSize(text);
-    if (n <= 0) return u"";
-    char16_t* wide = static_cast<char16_t*>(malloc((static_cast<size_t>(n) + 1) * sizeof(char16_t)));
-    if (wide == nullptr || ToWide(text, n + 1, wide, n + 1) == 0) return u"";
-    return wide;
-}
+const char kExeName[] = "QZ-Lumiscope_QZ-57.exe";
+const char kSplashResource[] = "BITMAP_SPLASH_57";
 
+// Each log line of the start-up sequence is written from the narrow stage text and ModuleName,
+// both widened afresh for the call (the copies are not released).
 void LogStage(int32_t level, const char* stageText, int32_t code) {
     LogWrite(level, WidenForLog(ModuleName), WidenForLog(stageText), code);
 }
@@ -46,7 +42,7 @@ Status RunLauncher() {
 
     // 1-2. The log lives in the user's documents folder. Without it there is no log path and no
     // tag; the log is still opened, with the empty path, and simply stays closed.
-    if (FindLogPath(logPath)) FormatText(ModuleName, sizeof ModuleName, "%s", LAUNCHER_EXE_NAME);
+    if (FindLogPath(logPath)) FormatText(ModuleName, sizeof ModuleName, "%s", kExeName);
     LogOpen(logPath);
 
     // 3-4. Both labels are written before the work they name.
@@ -63,7 +59,9 @@ Status RunLauncher() {
 
     // 7. The lock's name is the 8-bit instance name read as UTF-16, the name every instance and
     // every outside probe meets on.
-    if (!AcquireInstanceLock(reinterpret_cast<const char16_t*>(InstanceName))) {
+    char16_t lockName[kInstanceLockNameUnits];
+    FormInstanceLockName(lockName);
+    if (!AcquireInstanceLock(lockName)) {
         // Second instance: raise the running frame, hand over the arguments (or "-n"), end.
         ActivateRunningInstances();
         if (argc > 1) {
@@ -87,7 +85,7 @@ Status RunLauncher() {
         NoSplash = true;
     } else if (!NoSplash) {
         SplashParams splash;
-        splash.resourceName = LAUNCHER_SPLASH_RESOURCE;
+        splash.resourceName = kSplashResource;
         splash.displayMs = 20000;
         splash.centerOnScreen = 1;
         splash.topMost = 0;

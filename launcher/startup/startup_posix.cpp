@@ -8,8 +8,11 @@
 // first thread only waits for the result; when Java ends the process itself (System.exit), exit()
 // runs from a Java thread and the process ends with Java's code.
 #include "startup.h"
+#include "startup_platform.h"
 
-#include "../core/messages.h"
+#include "../errorbox/errorbox.h"
+#include "../folders/folders_posix.h"
+#include "../text/text.h"
 
 #include <errno.h>
 #include <fcntl.h>
@@ -22,8 +25,8 @@
 
 namespace {
 
-int processArgc = 0;
-char** processArgv = nullptr;
+int gProcessArgc = 0;
+char** gProcessArgv = nullptr;
 
 // Big enough for the VM's main thread (Java's default thread stack is 1 MB) and the launcher.
 const size_t kLauncherStackBytes = 8u << 20;
@@ -98,11 +101,11 @@ bool FindLogPath(char16_t* path) {
 // Arguments arrive as bytes; ill-formed UTF-8 becomes U+FFFD per maximal subpart.
 // A program started with no argv[0] at all gets an empty one, so argv[0] always exists.
 char16_t** SplitCommandLine(int32_t* argc) {
-    int count = processArgc > 0 ? processArgc : 1;
+    int count = gProcessArgc > 0 ? gProcessArgc : 1;
     char16_t** argv = static_cast<char16_t**>(calloc(static_cast<size_t>(count) + 1, sizeof(char16_t*)));
     if (argv == nullptr) abort();
     for (int i = 0; i < count; ++i) {
-        argv[i] = i < processArgc ? WideCopy(processArgv[i]) : nullptr;
+        argv[i] = i < gProcessArgc ? WideCopy(gProcessArgv[i]) : nullptr;
         if (argv[i] == nullptr) argv[i] = const_cast<char16_t*>(u"");
     }
     *argc = count;
@@ -118,8 +121,8 @@ int main(int argc, char** argv) {
     for (int stream = 0; stream <= 2; ++stream) {
         if (fcntl(stream, F_GETFD) < 0 && errno == EBADF && open("/dev/null", O_RDWR) < 0) break;
     }
-    processArgc = argc;
-    processArgv = argv;
+    gProcessArgc = argc;
+    gProcessArgv = argv;
     Status result = 0;
     pthread_attr_t attributes;
     pthread_t launcher;

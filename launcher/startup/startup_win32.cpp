@@ -8,6 +8,7 @@
 #include <direct.h>
 
 #include "startup.h"
+#include "startup_platform.h"
 
 bool FindLogPath(char16_t* path) {
     // CSIDL_FLAG_CREATE: the documents folder itself is created when it is missing. A failed call may

@@ -11,8 +11,8 @@
 #include <string>
 #include <vector>
 
-#include "jvm/jvm.h"
-#include "splash/splash.h"
+#include "splash/splash_platform.h"
+#include "text/text.h"
 
 namespace {
 
@@ -56,7 +56,7 @@ int Encode(const uint8_t* data, size_t size) {
     std::u16string text;
     for (size_t i = 0; i + 1 < size && (data[i] || data[i + 1]); i += 2) text += char16_t(data[i] | data[i + 1] << 8);
     EncodeBuffer buffer = {nullptr, 0};
-    Check(EncodeArgumentInto(u"x", &buffer) && EncodeArgumentInto(text.c_str(), &buffer), "encoded");
+    Check(EncodeArgument(u"x", &buffer) && EncodeArgument(text.c_str(), &buffer), "encoded");
     std::string want = text.empty() ? "0078" : "";
     for (char16_t unit : text) want += "0123456789abcdef"[unit >> 12], want += "0123456789abcdef"[unit >> 8 & 15],
                                        want += "0123456789abcdef"[unit >> 4 & 15], want += "0123456789abcdef"[unit & 15];

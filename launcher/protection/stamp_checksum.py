@@ -1,7 +1,7 @@
 #!/usr/bin/env python3
 """Stamps the checksum of an executable into its own stamp field, in place.
 
-The launcher compares the field with a checksum of its own file at start-up (launcher/protection).
+The launcher compares the field with a checksum of its own file at start-up (protection_posix.cpp, protection_win32.cpp).
 Windows: the PE image checksum field of the optional header (GNU ld leaves it 0). ELF: the four
 bytes after the marker "QZ57-STAMP-1" in the launcher's data, which must appear exactly once. The
 sum is the usual image checksum: the file's little-endian 16-bit words (an odd last byte as a word

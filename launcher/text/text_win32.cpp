@@ -1,11 +1,10 @@
 // Narrow text on Windows: the calling thread's ANSI code page (CP_THREAD_ACP), flags 0.
-#include "core.h"
+#include "text.h"
+#include "text_win32.h"
 
 #include <windows.h>
 #include <stdarg.h>
 #include <stdio.h>
-
-const char kDirectorySeparator[] = "\\";
 
 int NarrowSize(const char16_t* text) {
     if (text == nullptr) return 0;

@@ -8,9 +8,9 @@
 //
 // libX11 is not linked at load time: linking it brings five more libraries, which every start would
 // pay for, headless starts and second instances included. It is loaded when a display is first
-// wanted, and the X11 files call it through the Xlib table below.
-#ifndef LAUNCHER_CORE_XCONNECTION_X11_H
-#define LAUNCHER_CORE_XCONNECTION_X11_H
+// wanted, and the X11 files call it through the gXlib table below.
+#ifndef LAUNCHER_X11_XCONNECTION_X11_H
+#define LAUNCHER_X11_XCONNECTION_X11_H
 
 #include <X11/Xlib.h>
 #include <X11/Xutil.h>
@@ -33,9 +33,9 @@ struct XlibEntries {
 #undef LAUNCHER_XLIB_MEMBER
 };
 // Filled once by LoadXlib; read-only afterwards.
-extern XlibEntries Xlib;
+extern XlibEntries gXlib;
 
-// Loads libX11 and fills Xlib once per process, from whichever thread asks first, and makes Xlib
+// Loads libX11 and fills gXlib once per process, from whichever thread asks first, and makes Xlib
 // thread-safe before any other Xlib call. False when there is no display to talk to ($DISPLAY unset
 // or empty) or libX11 cannot be loaded whole. OpenXConnection calls it.
 bool LoadXlib();

@@ -1,6 +1,6 @@
 // Narrow text on POSIX systems: UTF-8. From UTF-16, an unpaired surrogate fails the conversion, as a
 // strict code-page conversion does on Windows; into UTF-16, ill-formed bytes are replaced.
-#include "core.h"
+#include "text.h"
 
 #include <stdarg.h>
 #include <stdio.h>
@@ -93,8 +93,6 @@ int DecodeUtf8(const char* text, int sourceBytes, char16_t* out, int outUnits) {
 }
 
 }  // namespace
-
-const char kDirectorySeparator[] = "/";
 
 int NarrowSize(const char16_t* text) { return text == nullptr ? 0 : EncodeUtf8(text, nullptr, 0); }
 int WideSize(const char* text) { return text == nullptr ? 0 : DecodeUtf8(text, -1, nullptr, 0); }

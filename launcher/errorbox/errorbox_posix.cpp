@@ -1,7 +1,7 @@
-// The error box and the string table on POSIX systems. The texts are built in; a box is always one
-// line on standard error ("caption: text"), and where there is a display also a dialog of our own
-// that the launch waits for, as it waits for a message box on Windows.
-#include "messages.h"
+// The string table on POSIX systems, whose texts are built in, and the cause lines on standard
+// error. (The box itself is errorbox_x11.cpp.)
+#include "errorbox.h"
+#include "errorbox_posix.h"
 
 #include <stdarg.h>
 #include <stdio.h>
@@ -34,15 +34,6 @@ char* LoadMessageText(int32_t id) {
         if (message.id == id) return strdup(message.text);
     }
     return nullptr;
-}
-
-void ShowErrorBox(const char* text) {
-    const char* caption = LoadMessageText(kMessageCaption);
-    if (caption == nullptr) caption = "Error";
-    if (text == nullptr) text = "";
-    fprintf(stderr, "%s: %s\n", caption, text);
-    fflush(stderr);
-    ShowErrorDialog(caption, text);
 }
 
 void ReportCause(const char* format, ...) {

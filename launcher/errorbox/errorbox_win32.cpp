@@ -1,6 +1,9 @@
 // The error box and the string table on Windows. MessageBoxA is looked up in "user32" on every call
 // and the module released after it, so a box can be shown whatever state the process is in.
-#include "messages.h"
+#include "errorbox.h"
+
+#include "../core/core.h"
+#include "../text/text.h"
 
 #include <windows.h>
 

@@ -7,12 +7,12 @@
 
 #include <atomic>
 
-XlibEntries Xlib;
+XlibEntries gXlib;
 
 namespace {
 
-pthread_once_t xlibOnce = PTHREAD_ONCE_INIT;
-bool xlibLoaded = false;
+pthread_once_t gXlibOnce = PTHREAD_ONCE_INIT;
+bool gXlibLoaded = false;
 
 // The library stays loaded for the life of the process (the Java toolkit may load it too).
 void ResolveXlib() {
@@ -21,22 +21,22 @@ void ResolveXlib() {
     void* library = dlopen("libX11.so.6", RTLD_NOW | RTLD_LOCAL);
     if (library == nullptr) return;
 #define LAUNCHER_XLIB_RESOLVE(name)                                                    \
-    Xlib.name = reinterpret_cast<decltype(Xlib.name)>(dlsym(library, #name));          \
-    if (Xlib.name == nullptr) return;
+    gXlib.name = reinterpret_cast<decltype(gXlib.name)>(dlsym(library, #name));          \
+    if (gXlib.name == nullptr) return;
     LAUNCHER_XLIB_ENTRIES(LAUNCHER_XLIB_RESOLVE)
 #undef LAUNCHER_XLIB_RESOLVE
-    Xlib.XInitThreads();  // before any other Xlib call: the splash thread and the main thread both use Xlib
-    xlibLoaded = true;
+    gXlib.XInitThreads();  // before any other Xlib call: the splash thread and the main thread both use Xlib
+    gXlibLoaded = true;
 }
 
 // The connections open at once: the splash's, the window search's and the dialog's, and one to spare.
 const int kSlots = 4;
-std::atomic<XConnection*> connections[kSlots];
-XErrorHandler previousErrorHandler = nullptr;
-XIOErrorHandler previousIoHandler = nullptr;
+std::atomic<XConnection*> gConnections[kSlots];
+XErrorHandler gPreviousErrorHandler = nullptr;
+XIOErrorHandler gPreviousIoHandler = nullptr;
 
 XConnection* Ours(Display* display) {
-    for (std::atomic<XConnection*>& slot : connections) {
+    for (std::atomic<XConnection*>& slot : gConnections) {
         XConnection* connection = slot.load();
         if (connection != nullptr && connection->display == display) return connection;
     }
@@ -48,7 +48,7 @@ int RecordXError(Display* display, XErrorEvent* error) {
         connection->failed = true;
         return 0;
     }
-    return previousErrorHandler != nullptr ? previousErrorHandler(display, error) : 0;
+    return gPreviousErrorHandler != nullptr ? gPreviousErrorHandler(display, error) : 0;
 }
 
 // A lost connection must not end the process. Xlib first calls the process-wide I/O error handler
@@ -56,7 +56,7 @@ int RecordXError(Display* display, XErrorEvent* error) {
 // both return for our connections, so Xlib gives up on them quietly.
 int QuietIoError(Display* display) {
     XConnection* connection = Ours(display);
-    if (connection == nullptr) return previousIoHandler != nullptr ? previousIoHandler(display) : 0;
+    if (connection == nullptr) return gPreviousIoHandler != nullptr ? gPreviousIoHandler(display) : 0;
     connection->lost = true;
     return 0;
 }
@@ -65,32 +65,32 @@ void RecordIoError(Display*, void* connection) { static_cast<XConnection*>(conne
 }  // namespace
 
 bool LoadXlib() {
-    pthread_once(&xlibOnce, ResolveXlib);
-    return xlibLoaded;
+    pthread_once(&gXlibOnce, ResolveXlib);
+    return gXlibLoaded;
 }
 
 bool OpenXConnection(XConnection* connection) {
     connection->failed = connection->lost = false;
     connection->display = nullptr;
     if (!LoadXlib()) return false;
-    connection->display = Xlib.XOpenDisplay(nullptr);
+    connection->display = gXlib.XOpenDisplay(nullptr);
     if (connection->display == nullptr) return false;
-    for (std::atomic<XConnection*>& slot : connections) {
+    for (std::atomic<XConnection*>& slot : gConnections) {
         XConnection* empty = nullptr;
         if (slot.compare_exchange_strong(empty, connection)) break;
     }
-    Xlib.XSetIOErrorExitHandler(connection->display, RecordIoError, connection);
-    XErrorHandler previous = Xlib.XSetErrorHandler(RecordXError);
-    if (previous != RecordXError) previousErrorHandler = previous;
-    XIOErrorHandler previousIo = Xlib.XSetIOErrorHandler(QuietIoError);
-    if (previousIo != QuietIoError) previousIoHandler = previousIo;
+    gXlib.XSetIOErrorExitHandler(connection->display, RecordIoError, connection);
+    XErrorHandler previous = gXlib.XSetErrorHandler(RecordXError);
+    if (previous != RecordXError) gPreviousErrorHandler = previous;
+    XIOErrorHandler previousIo = gXlib.XSetIOErrorHandler(QuietIoError);
+    if (previousIo != QuietIoError) gPreviousIoHandler = previousIo;
     return true;
 }
 
 void CloseXConnection(XConnection* connection) {
     if (connection->display == nullptr) return;
-    Xlib.XCloseDisplay(connection->display);
-    for (std::atomic<XConnection*>& slot : connections) {
+    gXlib.XCloseDisplay(connection->display);
+    for (std::atomic<XConnection*>& slot : gConnections) {
         XConnection* self = connection;
         slot.compare_exchange_strong(self, nullptr);
     }

@@ -1,5 +1,7 @@
-// Folders of the user on POSIX systems, as the freedesktop base-directory convention names them.
-#include "core.h"
+// The user's settings folder and the executable's own folder on POSIX systems (folders_posix.h).
+#include "folders_posix.h"
+
+#include "../text/text.h"
 
 #include <limits.h>
 #include <pwd.h>
