@@ -10,9 +10,8 @@
 #   make bench  start-up figures beside the alternatives (docs/performance.md)
 #   make fuzz   ten million runs of each fuzz target (picture reader, UTF-8 decoding, argument encoding)
 #   make size   print the size report of the release launchers
-BUILD ?= build
+# Every build is a CMake preset (CMakePresets.json; `cmake --list-presets`), in build/<preset>.
 JOBS ?= $(shell nproc)
-CMAKE_FLAGS ?= -G Ninja -DCMAKE_BUILD_TYPE=Release
 LINUX_DIST = dist/linux-x86_64
 
 WINDOWS_JRE ?=
@@ -26,59 +25,56 @@ all: dist
 deps:
 	bash tools/install-deps.sh
 
-$(BUILD)/i686/build.ninja:
-	cmake -S . -B $(BUILD)/i686 $(CMAKE_FLAGS) -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-i686-w64-mingw32.cmake
-$(BUILD)/x86_64/build.ninja:
-	cmake -S . -B $(BUILD)/x86_64 $(CMAKE_FLAGS) -DCMAKE_TOOLCHAIN_FILE=cmake/toolchain-x86_64-w64-mingw32.cmake
-$(BUILD)/linux/build.ninja:
-	cmake -S . -B $(BUILD)/linux $(CMAKE_FLAGS)
+build/%/build.ninja:
+	cmake --preset $*
 
 # The application folder of each platform, installed by its install rules (component "application").
 # On Linux the rules put it at lib/qz-lumiscope-qz57 under the prefix, as the package has it; the
 # folder is moved up from there.
-dist-linux: $(BUILD)/linux/build.ninja
-	cmake --build $(BUILD)/linux -j $(JOBS) --target launcher runtime
+dist-linux: build/linux/build.ninja
+	cmake --build --preset linux -j $(JOBS) --target launcher runtime
 	rm -rf $(DIST)/.linux $(LINUX_DIST)
-	cmake --install $(BUILD)/linux --component application --prefix $(DIST)/.linux
+	cmake --install build/linux --component application --prefix $(DIST)/.linux
 	mv $(DIST)/.linux/lib/qz-lumiscope-qz57 $(LINUX_DIST) && rm -rf $(DIST)/.linux
 
-dist-windows: $(BUILD)/i686/build.ninja $(BUILD)/x86_64/build.ninja
+dist-windows:
 	for arch in $(WINDOWS_ARCHS); do \
-	  cmake -S . -B $(BUILD)/$$arch -DWINDOWS_JRE=$(WINDOWS_JRE) >/dev/null && cmake --build $(BUILD)/$$arch -j $(JOBS) --target launcher vmdouble demo_jar && \
-	  rm -rf $(DIST)/$$arch && cmake --install $(BUILD)/$$arch --component application --prefix $(DIST)/$$arch || exit 1; \
+	  cmake --preset $$arch -DWINDOWS_JRE=$(WINDOWS_JRE) >/dev/null && \
+	  cmake --build --preset $$arch -j $(JOBS) --target launcher vmdouble demo_jar && \
+	  rm -rf $(DIST)/$$arch && cmake --install build/$$arch --component application --prefix $(DIST)/$$arch || exit 1; \
 	done
 
 # Every package into dist/: CPack in each build folder (DEB on Linux, NSIS for each Windows architecture).
 package: dist-linux dist-windows
-	cmake --build $(BUILD)/linux -j $(JOBS) --target package_files
+	cmake --build --preset linux -j $(JOBS) --target package_files
 	for build in linux $(WINDOWS_ARCHS); do \
-	  (cd $(BUILD)/$$build && cpack -D CPACK_OUTPUT_FILE_PREFIX=$(DIST)) || exit 1; \
+	  (cd build/$$build && cpack -D CPACK_OUTPUT_FILE_PREFIX=$(DIST)) || exit 1; \
 	done
 
 dist: dist-linux dist-windows
-	bash tools/size-report.sh $(BUILD)
+	bash tools/size-report.sh build
 
 demo: dist-linux
 	bash tools/demo.sh $(LINUX_DIST) demo-out
 
 test: package
-	bash tests/run.sh $(BUILD)
+	bash tests/run.sh
 
 # Start-up figures (not a test): writes docs/performance.md and docs/performance.png.
-bench: dist-linux $(BUILD)/x86_64/build.ninja
-	cmake --build $(BUILD)/x86_64 -j $(JOBS) --target launcher vmdouble
-	/usr/bin/python3 tools/bench/bench.py --build $(BUILD)
+bench: dist-linux build/x86_64/build.ninja
+	cmake --build --preset x86_64 -j $(JOBS) --target launcher vmdouble
+	/usr/bin/python3 tools/bench/bench.py --build build
 
 # Ten million runs of each libFuzzer target (CI runs each for 20 s); new inputs go to long-<name>/.
 FUZZERS = Picture Utf8 Encode
-fuzz: $(BUILD)/linux/build.ninja
-	cmake --build $(BUILD)/linux -j $(JOBS) $(addprefix --target build_fuzz_,$(FUZZERS))
-	cd $(BUILD)/linux/tests/host && ./units --seeds seeds && for f in $(FUZZERS); do mkdir -p long-$$f && \
+fuzz: build/fuzz/build.ninja
+	cmake --build --preset fuzz -j $(JOBS)
+	cd build/fuzz/tests/host && ./units --seeds seeds && for f in $(FUZZERS); do mkdir -p long-$$f && \
 	  ./fuzz_$$f -runs=10000000 -seed=1 -max_len=4096 -print_final_stats=1 long-$$f \
 	    $$([ $$f = Picture ] && echo seeds) || exit 1; done
 
 size:
-	bash tools/size-report.sh $(BUILD)
+	bash tools/size-report.sh build
 
 clean:
-	rm -rf $(BUILD) dist demo-out
+	rm -rf build dist demo-out

@@ -1,14 +1,16 @@
 #!/usr/bin/env bash
-# Every suite: the host tests through ctest (the pure pieces under ASan and UBSan, 20 s of each fuzz
-# target), then the scenario table through pytest, once for every platform this machine can run: the
-# Linux build with the real JVM, and each Windows architecture Wine can execute (found by executing its
-# loader). Says plainly what it could not run; fails when a suite fails or no Windows build was tested.
+# Every suite: the host tests through ctest (the pure pieces under ASan and UBSan; 20 s of each fuzz
+# target, built by the fuzz preset), then the scenario table through pytest, once for every platform this machine can run: the Linux build
+# with the real JVM, and each Windows architecture Wine can execute (found by executing its loader).
+# Says plainly what it could not run; fails when a suite fails or no Windows build was tested. The
+# builds are the CMake presets', in build/<preset>.
 set -u
 cd "$(dirname "$0")/.." || exit 2
-build=${1:-build} platforms=linux-x86_64 status=0 notes=()
-cmake --build "$build/linux" && (cd "$build/linux" && ctest --output-on-failure) || status=1
+build=build platforms=linux-x86_64 status=0 notes=()
+cmake --build --preset linux && ctest --preset linux || status=1
+{ cmake --preset fuzz >/dev/null && cmake --build --preset fuzz && ctest --preset fuzz; } || status=1
 for arch in i686 x86_64; do
-  cmake --build "$build/$arch" || { status=1; continue; }
+  { cmake --preset "$arch" >/dev/null && cmake --build --preset "$arch"; } || { status=1; continue; }
   loader=/usr/lib/wine/wine; [ "$arch" = x86_64 ] && loader=/usr/lib/wine/wine64
   if "$loader" --version >/dev/null 2>&1; then platforms+=",wine-$arch"
   elif [ "$arch" = i686 ] && [ -e /lib/ld-linux.so.2 ] && ! /lib/ld-linux.so.2 --version >/dev/null 2>&1; then

@@ -79,9 +79,8 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launch
     ("overlong UTF-8 accepted", "linux", "arguments-as-bytes",
      [("text/text_posix.cpp", "c < 0x80 ? 1 : c < 0xC2 ? 0", "c < 0x80 ? 1 : c < 0xC0 ? 0")]),
 ]
-BUILDS = {"linux": ("linux", [], ["launcher"]),
-          "wine": ("x86_64", ["-DCMAKE_TOOLCHAIN_FILE={scratch}/cmake/toolchain-x86_64-w64-mingw32.cmake"],
-                   ["launcher", "launcher_nostrings"])}
+# Where each platform's plants are built (a preset of CMakePresets.json) and what is rebuilt per plant.
+BUILDS = {"linux": ("linux", ["launcher"]), "wine": ("x86_64", ["launcher", "launcher_nostrings"])}
 
 def main(names, scratch=Path("/tmp/planted-faults")):
     faults = [f for f in FAULTS if not names or any(n in f[0] for n in names)]
@@ -92,17 +91,16 @@ def main(names, scratch=Path("/tmp/planted-faults")):
         [sys.executable, "-m", "pytest", "tests/table", "-p", "no:cacheprovider", "-q", "-rf", "--build", "build",
          "--platforms", f"{platform}-x86_64", "-k", rows], cwd=scratch, capture_output=True, text=True)
     for platform in sorted({f[1] for f in faults}):  # everything the table needs, and its rows pass before any fault
-        folder, options, _ = BUILDS[platform]
-        subprocess.run(["cmake", "-S", scratch, "-B", scratch / "build" / folder, "-G", "Ninja", "-DCMAKE_BUILD_TYPE=Release",
-                        *[o.format(scratch=scratch) for o in options]], check=True, **quiet)
-        subprocess.run(["cmake", "--build", scratch / "build" / folder], check=True, **quiet)
+        preset, _ = BUILDS[platform]
+        subprocess.run(["cmake", "--preset", preset], cwd=scratch, check=True, **quiet)
+        subprocess.run(["cmake", "--build", "--preset", preset], cwd=scratch, check=True, **quiet)
         baseline = table(platform, " or ".join(f"({f[2]})" for f in faults if f[1] == platform))
         if baseline.returncode != 0:
             print(f"the rows fail on {platform} without any fault planted:\n{baseline.stdout[-3000:]}")
             return False
     caught = 0
     for name, platform, rows, edits in faults:
-        folder, _, targets = BUILDS[platform]
+        preset, targets = BUILDS[platform]
         originals = {}
         for file, old, new in edits:
             path = scratch / "launcher" / file
@@ -110,7 +108,7 @@ def main(names, scratch=Path("/tmp/planted-faults")):
             originals.setdefault(path, text)
             assert text.count(old) == 1, f"{name}: {old!r} does not occur once in {file}"
             path.write_text(text.replace(old, new))
-        built = subprocess.run(["cmake", "--build", scratch / "build" / folder, "--target", *targets], **quiet).returncode == 0
+        built = subprocess.run(["cmake", "--build", "--preset", preset, "--target", *targets], cwd=scratch, **quiet).returncode == 0
         run = table(platform, rows)
         failed = re.findall(r"^FAILED \S+::(\S+)", run.stdout, re.M) if built else []
         caught += bool(failed)
