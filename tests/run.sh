@@ -1,6 +1,7 @@
 #!/usr/bin/env bash
 # Every suite: the host tests through ctest (the pure pieces under ASan and UBSan; 20 s of each fuzz
-# target, built by the fuzz preset), then the scenario table through pytest, once for every platform this machine can run: the Linux build
+# target, built by the fuzz preset), a check that every planted fault still applies to the source,
+# then the scenario table through pytest, once for every platform this machine can run: the Linux build
 # with the real JVM, and each Windows architecture Wine can execute (found by executing its loader).
 # Says plainly what it could not run; fails when a suite fails or no Windows build was tested. The
 # builds are the CMake presets', in build/<preset>.
@@ -9,6 +10,7 @@ cd "$(dirname "$0")/.." || exit 2
 build=build platforms=linux-x86_64 status=0 notes=()
 cmake --build --preset linux && ctest --preset linux || status=1
 { cmake --preset fuzz >/dev/null && cmake --build --preset fuzz && ctest --preset fuzz; } || status=1
+/usr/bin/python3 tests/table/faults.py --check || status=1
 for arch in i686 x86_64; do
   { cmake --preset "$arch" >/dev/null && cmake --build --preset "$arch"; } || { status=1; continue; }
   loader=/usr/lib/wine/wine; [ "$arch" = x86_64 ] && loader=/usr/lib/wine/wine64

@@ -1,6 +1,6 @@
-// The launcher's pure pieces that the scenario table cannot reach cheaply: the splash picture reader
-// with broken and unusual pictures, as one table; and three properties that must hold for any input,
-// run here over the table's pictures and a few texts, and built with FUZZ_TARGET as libFuzzer targets.
+// The launcher's pure pieces that the scenario table cannot reach cheaply, as one table of named
+// behaviours: the splash picture reader with broken and unusual pictures. Three properties that must hold for any input run here
+// over the table's pictures and a few texts, and are built with FUZZ_TARGET as libFuzzer targets.
 //   units                 run the table and the properties (always under ASan and UBSan)
 //   units --seeds DIR     write the table's pictures to DIR, as seeds for the picture fuzz target
 #include <stdint.h>
@@ -50,17 +50,21 @@ int Utf8(const uint8_t* data, size_t size) {
     return 0;
 }
 
-// Argument encoding: four lower-case hex digits per UTF-16 unit that decode back to it; an empty
-// argument leaves the reused buffer holding the previous one.
+// Argument encoding, in a buffer reused across arguments: four lower-case hex digits per UTF-16
+// unit, which read back as hex give the unit again; an empty argument leaves the buffer holding the
+// argument before it.
 int Encode(const uint8_t* data, size_t size) {
     std::u16string text;
     for (size_t i = 0; i + 1 < size && (data[i] || data[i + 1]); i += 2) text += char16_t(data[i] | data[i + 1] << 8);
     EncodeBuffer buffer = {nullptr, 0};
     Check(EncodeArgument(u"x", &buffer) && EncodeArgument(text.c_str(), &buffer), "encoded");
-    std::string want = text.empty() ? "0078" : "";
-    for (char16_t unit : text) want += "0123456789abcdef"[unit >> 12], want += "0123456789abcdef"[unit >> 8 & 15],
-                                       want += "0123456789abcdef"[unit >> 4 & 15], want += "0123456789abcdef"[unit & 15];
-    Check(want == buffer.text, "encoding", long(text.size()));
+    if (text.empty()) Check(strcmp(buffer.text, "0078") == 0, "an empty argument repeats the one before");
+    Check(text.empty() || strlen(buffer.text) == 4 * text.size(), "four digits per unit", long(text.size()));
+    for (size_t i = 0; i < text.size(); ++i) {
+        const char* digits = buffer.text + 4 * i;
+        Check(strspn(digits, "0123456789abcdef") >= 4, "lower-case hex digits", long(i));
+        Check(strtoul(std::string(digits, 4).c_str(), nullptr, 16) == text[i], "the digits read back as the unit", long(i));
+    }
     free(buffer.text);
     return 0;
 }
@@ -69,14 +73,15 @@ typedef std::vector<uint8_t> Image;
 void Put(Image& image, size_t at, uint32_t value, int bytes = 4) {
     for (int i = 0; i < bytes; ++i) image[at + i] = uint8_t(value >> (8 * i));
 }
+enum { kInfoSizeAt = 14, kWidthAt = 18, kHeightAt = 22, kBitCountAt = 28, kCompressionAt = 30, kSizeImageAt = 34 };
 // An uncompressed bitmap file image, full colour table, zeroed pixels; bfOffBits and biClrUsed hold
 // values the reader must not use.
 Image Make(int bits, int32_t width, int32_t height, uint32_t infoSize = 40) {
     size_t table = bits == 8 ? 1024 : bits == 4 ? 64 : bits == 1 ? 8 : 0;
     Image image(14 + infoSize + table + (size_t(abs(width)) * bits + 31) / 32 * 4 * abs(height), 0);
     image[0] = 'B', image[1] = 'M';
-    Put(image, 10, 9999), Put(image, 14, infoSize), Put(image, 18, width), Put(image, 22, height), Put(image, 26, 1, 2);
-    Put(image, 28, bits, 2), Put(image, 46, 2);
+    Put(image, 10, 9999), Put(image, kInfoSizeAt, infoSize), Put(image, kWidthAt, width), Put(image, kHeightAt, height);
+    Put(image, 26, 1, 2), Put(image, kBitCountAt, bits, 2), Put(image, 46, 2);
     return image;
 }
 
@@ -84,38 +89,67 @@ std::vector<Image> PictureTable() {
     std::vector<Image> seen;
     SplashBitmapInfo info;
     auto read = [&](const Image& image) { seen.push_back(image); return ReadSplashBitmap(image.data(), image.size(), &info); };
-    struct { int bits, width, height; uint32_t infoSize; int wantWidth, wantHeight; size_t pixels; } sized[] = {
-        {24, 33, 7, 40, 33, 7, 54}, {8, 33, 7, 40, 33, 7, 54 + 1024}, {4, 33, 7, 40, 33, 7, 54 + 64}, {1, 33, 7, 40, 33, 7, 54 + 8},
-        {8, 16, 4, 124, 16, 4, 14 + 124 + 1024},  // a longer info header moves the pixels
-        {24, 300, -200, 40, 300, 200, 54}, {24, -5, 3, 40, 5, 3, 54}, {24, 0, 0, 40, 0, 0, 54}};
-    for (auto& c : sized)
-        Check(read(Make(c.bits, c.width, c.height, c.infoSize)) && info.width == c.wantWidth && info.height == c.wantHeight &&
-              info.infoOffset == 14 && info.pixelOffset == c.pixels, "sized", c.bits * 1000 + c.width);
+    struct Sized {
+        const char* behaviour;
+        Image image;
+        int32_t width, height;
+        size_t pixelsAt;
+    } sized[] = {
+        {"24 bits: the pixels right behind the two headers", Make(24, 33, 7), 33, 7, 54},
+        {"8 bits: the pixels behind a table of 256 colours", Make(8, 33, 7), 33, 7, 54 + 1024},
+        {"4 bits: the pixels behind a table of 16 colours", Make(4, 33, 7), 33, 7, 54 + 64},
+        {"1 bit: the pixels behind a table of 2 colours", Make(1, 33, 7), 33, 7, 54 + 8},
+        {"a longer info header moves the pixels", Make(8, 16, 4, 124), 16, 4, 14 + 124 + 1024},
+        {"a top-down picture (negative height) is as high as its height's size", Make(24, 300, -200), 300, 200, 54},
+        {"a negative width counts by its size", Make(24, -5, 3), 5, 3, 54},
+        {"an empty picture is 0 by 0", Make(24, 0, 0), 0, 0, 54},
+    };
+    for (const Sized& c : sized)
+        Check(read(c.image) && info.width == c.width && info.height == c.height && info.infoOffset == 14 &&
+              info.pixelOffset == c.pixelsAt, c.behaviour);
     for (int bits : {16, 32, 0, 2, 48}) {  // sized but not drawn, so their pixels need not be there
         Image image = Make(24, 300, 200);
-        Put(image, 28, bits, 2), image.resize(54);
-        Check(read(image) && info.width == 300 && info.height == 200 && info.pixelOffset == 0, "not drawn", bits);
+        Put(image, kBitCountAt, bits, 2), image.resize(54);
+        Check(read(image) && info.width == 300 && info.height == 200 && info.pixelOffset == 0,
+              "a bit count that is not drawn still gives the size", bits);
     }
-    Check(!read(Image()), "no bytes at all");
-    struct { int bits; size_t at; uint32_t value, bytes, height; } rejected[] = {  // one field changed (and the height)
-        {24, 0, 'B' | 'A' << 8, 2}, {24, 0, 'M' | 'B' << 8, 2}, {24, 0, 'b' | 'm' << 8, 2},  // signatures
-        {8, 14, 0}, {8, 14, 12}, {8, 14, 39}, {8, 14, 0xFFFFFFFF}, {8, 14, 0xFFFFFFF0}, {8, 14, 0x80000000},  // info header sizes
-        {24, 18, 0x7FFFFFFF, 4, 0x7FFFFFFF}, {24, 18, 0x40000000, 4, 0x40000000}, {24, 18, 0x10000, 4, 0x10000},  // rows that wrap
-        {24, 18, 1, 4, 0x80000000}};  // a height with no positive twin
-    for (auto& r : rejected) {
-        Image image = Make(r.bits, 1, 1);
-        Put(image, r.at, r.value, r.bytes ? r.bytes : 4), Put(image, 22, r.height ? r.height : 1);
-        Check(!read(image), "rejected", long(r.at << 32 | r.value));
+    Check(!read(Image()), "no bytes at all are no picture");
+    struct Broken {
+        const char* behaviour;
+        int bits;
+        void (*change)(Image&);
+    } rejected[] = {
+        {"the signature BA is not a bitmap", 24, [](Image& i) { i[1] = 'A'; }},
+        {"the signature reversed (MB) is not a bitmap", 24, [](Image& i) { i[0] = 'M', i[1] = 'B'; }},
+        {"a lower-case signature is not a bitmap", 24, [](Image& i) { i[0] = 'b', i[1] = 'm'; }},
+        {"an info header of no bytes", 8, [](Image& i) { Put(i, kInfoSizeAt, 0); }},
+        {"an info header of 12 bytes (the old core header)", 8, [](Image& i) { Put(i, kInfoSizeAt, 12); }},
+        {"an info header one byte short", 8, [](Image& i) { Put(i, kInfoSizeAt, 39); }},
+        {"an info header longer than the file (its size wraps any sum)", 8, [](Image& i) { Put(i, kInfoSizeAt, 0xFFFFFFFF); }},
+        {"an info header longer than the file", 8, [](Image& i) { Put(i, kInfoSizeAt, 0xFFFFFFF0); }},
+        {"an info header of 2 GB", 8, [](Image& i) { Put(i, kInfoSizeAt, 0x80000000); }},
+        {"rows of the largest picture, whose size wraps 32 bits", 24,
+         [](Image& i) { Put(i, kWidthAt, 0x7FFFFFFF), Put(i, kHeightAt, 0x7FFFFFFF); }},
+        {"rows of 2^30 by 2^30 pixels", 24, [](Image& i) { Put(i, kWidthAt, 0x40000000), Put(i, kHeightAt, 0x40000000); }},
+        {"rows of 65536 by 65536 pixels", 24, [](Image& i) { Put(i, kWidthAt, 0x10000), Put(i, kHeightAt, 0x10000); }},
+        {"a height of -2^31, which has no positive twin", 24, [](Image& i) { Put(i, kHeightAt, 0x80000000); }},
+    };
+    for (const Broken& c : rejected) {
+        Image image = Make(c.bits, 1, 1);
+        c.change(image);
+        Check(!read(image), c.behaviour);
     }
-    for (int bits : {24, 8, 4, 1}) {  // every cut through headers, table or padded rows is absent
+    for (int bits : {24, 8, 4, 1}) {
         Image whole = Make(bits, 13, 5);
-        for (size_t size = 1; size < whole.size(); ++size) Check(!read(Image(whole.begin(), whole.begin() + size)), "cut", long(size));
+        for (size_t size = 1; size < whole.size(); ++size)
+            Check(!read(Image(whole.begin(), whole.begin() + size)), "a picture cut anywhere in headers, table or rows is absent", long(size));
         whole.push_back(0);
-        Check(read(whole), "trailing bytes do no harm", bits);
+        Check(read(whole), "bytes after the last row do no harm", bits);
     }
     Image rle = Make(8, 64, 64);
-    rle.resize(14 + 40 + 1024 + 100), Put(rle, 30, 1);  // BI_RLE8: its stored length must be there
-    for (uint32_t stored : {100u, 101u, 0u}) Put(rle, 34, stored), Check(read(rle) == (stored == 100), "run-length size", long(stored));
+    rle.resize(14 + 40 + 1024 + 100), Put(rle, kCompressionAt, 1);  // run-length, 100 bytes of it
+    for (uint32_t stored : {100u, 101u, 0u})
+        Put(rle, kSizeImageAt, stored), Check(read(rle) == (stored == 100), "a run-length picture has the length it states", long(stored));
     // Pixels: 2 x 2 at 24 bits bottom-up, and at 1 bit top-down through its colour table.
     Image rgb = Make(24, 2, 2), mono = Make(1, 2, -2);
     Put(rgb, 54, 0x010203, 3), Put(rgb, 57, 0x040506, 3), Put(rgb, 62, 0x0A0B0C, 3);

@@ -20,7 +20,6 @@
 import itertools
 import shutil
 import socket
-import struct
 import subprocess
 import threading
 import time
@@ -54,10 +53,10 @@ class App:
 
 
 class Listener(threading.Thread):  # the running application's end of the hand-off: keeps what arrives
-    # until the sender closes, or resets the connection after `drop_after` bytes; counts connections
-    def __init__(self, drop_after=None):
+    # until the sender closes; counts connections
+    def __init__(self):
         super().__init__(daemon=True)
-        self.drop_after, self.received, self.connections, self.closed_by_sender = drop_after, b"", 0, False
+        self.received, self.connections, self.closed_by_sender = b"", 0, False
         self.sock = port_free()
         self.sock.listen(4)
         self.sock.settimeout(60)
@@ -68,12 +67,9 @@ class Listener(threading.Thread):  # the running application's end of the hand-o
         except OSError:
             return  # nobody came: the row's check says so
         conn.settimeout(30)
-        room = lambda: 1 << 16 if self.drop_after is None else self.drop_after - len(self.received)
-        while not self.closed_by_sender and room() > 0:
-            chunk = conn.recv(room())
+        while not self.closed_by_sender:
+            chunk = conn.recv(1 << 16)
             self.received, self.closed_by_sender = self.received + chunk, not chunk
-        if self.drop_after:
-            conn.setsockopt(socket.SOL_SOCKET, socket.SO_LINGER, struct.pack("ii", 1, 0))
         conn.close()
 
     def finish(self):

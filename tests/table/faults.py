@@ -1,14 +1,18 @@
-# Planted faults: small patches to the launcher, each of which some rows of the table must catch.
+# Planted faults: small patches to the launcher, each of which some rows of the table (or the host
+# tests' table) must catch.
 # tools/planted-faults.sh [NAME-PART...]   builds each (or those named) in a scratch copy (the Linux
-# build, or x86_64 under Wine for Windows code), runs the rows that can reach it, prints "N of N caught".
-# Those rows must first pass on the unpatched copy, so that no fault counts as caught by a broken bed.
+# build, x86_64 under Wine for Windows code, or the host tests), runs the rows that can reach it,
+# prints "N of N caught". Those rows must first pass on the unpatched copy, so that no fault counts as
+# caught by a broken bed.
+# faults.py --check   only says whether every plant still applies: its text stands exactly once in
+# its file. A plant whose code moved or changed fails loudly here (and in `make test`), never silently.
 import re
 import shutil
 import subprocess
 import sys
 from pathlib import Path
 
-FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launcher/, old, new)]
+FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run whole), [(file under launcher/, old, new)]
     ("upper-case hex digits", "linux", "arguments-encoded or hand-off-arguments",
      [("text/encode_argument.cpp", '"0123456789abcdef"', '"0123456789ABCDEF"')]),
     ("empty argument not repeating the previous one", "linux", "arguments-encoded or hand-off-arguments",
@@ -78,25 +82,58 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launch
        'void LogPlatformWriteFailed(uint32_t) { (void)!write(1, "WriteFile failed with error 9.\\n", 31); }')]),
     ("overlong UTF-8 accepted", "linux", "arguments-as-bytes",
      [("text/text_posix.cpp", "c < 0x80 ? 1 : c < 0xC2 ? 0", "c < 0x80 ? 1 : c < 0xC0 ? 0")]),
+    ("the lock's name paired high byte first", "linux", "hand-off-no-arguments",
+     [("instance/instance.cpp", "bytes[2 * i] | bytes[2 * i + 1] << 8", "bytes[2 * i] << 8 | bytes[2 * i + 1]")]),
+    ("a picture's rows not checked against its bytes", "host", "",
+     [("splash/splash_bitmap.cpp", "if (stride != 0 && static_cast<uint64_t>(height) > pixelBytes / stride) return false;", "")]),
 ]
-# Where each platform's plants are built (a preset of CMakePresets.json) and what is rebuilt per plant.
-BUILDS = {"linux": ("linux", ["launcher"]), "wine": ("x86_64", ["launcher", "launcher_nostrings"])}
+# Where each platform's plants are built and what is rebuilt per plant: a preset (CMakePresets.json)
+# and its targets.
+BUILDS = {"linux": ("linux", ["launcher"]), "wine": ("x86_64", ["launcher", "launcher_nostrings"]), "host": ("linux", ["units"])}
+ROOT = Path(__file__).resolve().parents[2]
+
+
+def stale(faults, tree=ROOT):
+    """The plants whose text does not stand exactly once in its file of `tree`, each said plainly."""
+    problems = []
+    for name, _, _, edits in faults:
+        texts = {}
+        for file, old, new in edits:
+            path = tree / "launcher" / file
+            text = texts.setdefault(path, path.read_text() if path.exists() else None)
+            if text is None or text.count(old) != 1:
+                problems.append(f"{name}: {old!r} stands {0 if text is None else text.count(old)} times in launcher/{file}, not once")
+            else:
+                texts[path] = text.replace(old, new)
+    return problems
+
 
 def main(names, scratch=Path("/tmp/planted-faults")):
     faults = [f for f in FAULTS if not names or any(n in f[0] for n in names)]
+    problems = stale(faults)
+    if problems:
+        print("plants that no longer apply (move each to where its code now lives):", *problems, sep="\n  ")
+        return False
     shutil.rmtree(scratch, ignore_errors=True)
-    shutil.copytree(Path(__file__).resolve().parents[2], scratch, ignore=shutil.ignore_patterns("build", "dist", ".git"))
+    shutil.copytree(ROOT, scratch, ignore=shutil.ignore_patterns("build", "dist", ".git"))
     quiet = dict(stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
-    table = lambda platform, rows: subprocess.run(
-        [sys.executable, "-m", "pytest", "tests/table", "-p", "no:cacheprovider", "-q", "-rf", "--build", "build",
-         "--platforms", f"{platform}-x86_64", "-k", rows], cwd=scratch, capture_output=True, text=True)
+
+    def run_rows(platform, rows):  # (failed row names, completed run)
+        if platform == "host":
+            run = subprocess.run([scratch / "build/linux/tests/host/units"], capture_output=True, text=True)
+            failed = ["units: " + (re.findall(r"(FAILED: .*|ERROR: AddressSanitizer: [\w-]+)", run.stdout + run.stderr) or ["failed"])[0]]
+            return (failed if run.returncode else []), run
+        run = subprocess.run([sys.executable, "-m", "pytest", "tests/table", "-p", "no:cacheprovider", "-q", "-rf", "--build", "build",
+                              "--platforms", f"{platform}-x86_64", "-k", rows], cwd=scratch, capture_output=True, text=True)
+        return re.findall(r"^FAILED \S+::(\S+)", run.stdout, re.M), run
+
     for platform in sorted({f[1] for f in faults}):  # everything the table needs, and its rows pass before any fault
         preset, _ = BUILDS[platform]
         subprocess.run(["cmake", "--preset", preset], cwd=scratch, check=True, **quiet)
         subprocess.run(["cmake", "--build", "--preset", preset], cwd=scratch, check=True, **quiet)
-        baseline = table(platform, " or ".join(f"({f[2]})" for f in faults if f[1] == platform))
-        if baseline.returncode != 0:
-            print(f"the rows fail on {platform} without any fault planted:\n{baseline.stdout[-3000:]}")
+        failed, baseline = run_rows(platform, " or ".join(f"({f[2]})" for f in faults if f[1] == platform))
+        if failed or baseline.returncode != 0:
+            print(f"the rows fail on {platform} without any fault planted:\n{(baseline.stdout + baseline.stderr)[-3000:]}")
             return False
     caught = 0
     for name, platform, rows, edits in faults:
@@ -104,13 +141,10 @@ def main(names, scratch=Path("/tmp/planted-faults")):
         originals = {}
         for file, old, new in edits:
             path = scratch / "launcher" / file
-            text = path.read_text()
-            originals.setdefault(path, text)
-            assert text.count(old) == 1, f"{name}: {old!r} does not occur once in {file}"
-            path.write_text(text.replace(old, new))
+            originals.setdefault(path, path.read_text())
+            path.write_text(path.read_text().replace(old, new))
         built = subprocess.run(["cmake", "--build", "--preset", preset, "--target", *targets], cwd=scratch, **quiet).returncode == 0
-        run = table(platform, rows)
-        failed = re.findall(r"^FAILED \S+::(\S+)", run.stdout, re.M) if built else []
+        failed, run = run_rows(platform, rows) if built else ([], None)
         caught += bool(failed)
         verdict = "caught by " + ", ".join(failed) if failed else "does not build" if not built else \
             "NOT CAUGHT" if run.returncode == 0 else "NOT CAUGHT, the rows could not run:\n" + run.stdout[-2000:]
@@ -120,5 +154,10 @@ def main(names, scratch=Path("/tmp/planted-faults")):
     print(f"{caught} of {len(faults)} caught")
     return caught == len(faults)
 
+
 if __name__ == "__main__":
+    if sys.argv[1:] == ["--check"]:
+        problems = stale(FAULTS)
+        print(*problems, sep="\n") if problems else print(f"all {len(FAULTS)} planted faults apply")
+        sys.exit(1 if problems else 0)
     sys.exit(0 if main(sys.argv[1:]) else 1)
