@@ -18,8 +18,10 @@ void LogPlatformClose(LogHandle handle);
 // bookkeeping, since standard output there is the user's terminal.
 void LogPlatformWriteFailed(uint32_t error);
 // How many bytes of narrow `text` WidenForLog converts, given the unit count (terminator included)
-// the conversion asked for: that count plus one, as the log has always done it (one byte past a
-// single-byte text's terminator, which every source buffer keeps zero).
+// the conversion asked for: on Windows that count plus one, as the log has always done it (one byte
+// past a single-byte text's terminator, which every source buffer keeps zero); on POSIX the text's
+// own length through its terminator, since UTF-8 spends more bytes than units and the count would
+// cut a text short, leaving it unterminated.
 int LogPlatformWidenBytes(const char* text, int units);
 
 #endif

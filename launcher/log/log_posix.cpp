@@ -9,6 +9,7 @@
 #include <errno.h>
 #include <fcntl.h>
 #include <stdlib.h>
+#include <string.h>
 #include <sys/file.h>
 #include <unistd.h>
 
@@ -43,4 +44,4 @@ void LogPlatformClose(LogHandle handle) {
 
 void LogPlatformWriteFailed(uint32_t) {}
 
-int LogPlatformWidenBytes(const char*, int units) { return units + 1; }
+int LogPlatformWidenBytes(const char* text, int) { return static_cast<int>(strlen(text)) + 1; }

@@ -84,6 +84,9 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run w
      [("text/text_posix.cpp", "c < 0x80 ? 1 : c < 0xC2 ? 0", "c < 0x80 ? 1 : c < 0xC0 ? 0")]),
     ("the lock's name paired high byte first", "linux", "hand-off-no-arguments",
      [("instance/instance.cpp", "bytes[2 * i] | bytes[2 * i + 1] << 8", "bytes[2 * i] << 8 | bytes[2 * i + 1]")]),
+    ("the log's text cut at the unit count on Linux", "host", "",
+     [("log/log_posix.cpp", "return static_cast<int>(strlen(text)) + 1;", "return units + 1;"),
+      ("log/log_posix.cpp", "int LogPlatformWidenBytes(const char* text, int)", "int LogPlatformWidenBytes(const char*, int units)")]),
     ("a picture's rows not checked against its bytes", "host", "",
      [("splash/splash_bitmap.cpp", "if (stride != 0 && static_cast<uint64_t>(height) > pixelBytes / stride) return false;", "")]),
 ]
