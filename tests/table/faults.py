@@ -10,6 +10,7 @@ import re
 import shutil
 import subprocess
 import sys
+import tempfile
 from pathlib import Path
 
 FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run whole), [(file under launcher/, old, new)]
@@ -111,8 +112,10 @@ def stale(faults, tree=ROOT):
     return problems
 
 
-def main(names, scratch=Path("/tmp/planted-faults")):
+def main(names):
     faults = [f for f in FAULTS if not names or any(n in f[0] for n in names)]
+    # A scratch copy of this checkout's own: another checkout's run never finds its copy replaced.
+    scratch = Path(tempfile.gettempdir()) / f"planted-faults-{ROOT.name}"
     problems = stale(faults)
     if problems:
         print("plants that no longer apply (move each to where its code now lives):", *problems, sep="\n  ")
