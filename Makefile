@@ -44,11 +44,11 @@ dist-windows:
 	  rm -rf $(DIST)/$$arch && cmake --install build/$$arch --component application --prefix $(DIST)/$$arch || exit 1; \
 	done
 
-# Every package into dist/: CPack in each build folder (DEB on Linux, NSIS for each Windows architecture).
+# Every package into dist/: CPack's preset of each build (DEB on Linux, NSIS for each Windows architecture).
 package: dist-linux dist-windows
 	cmake --build --preset linux -j $(JOBS) --target package_files
-	for build in linux $(WINDOWS_ARCHS); do \
-	  (cd build/$$build && cpack -D CPACK_OUTPUT_FILE_PREFIX=$(DIST)) || exit 1; \
+	for preset in linux $(WINDOWS_ARCHS); do \
+	  cpack --preset $$preset -D CPACK_OUTPUT_FILE_PREFIX=$(DIST) || exit 1; \
 	done
 
 dist: dist-linux dist-windows
