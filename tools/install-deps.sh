@@ -24,6 +24,7 @@ BASE_PKGS=(
   python3-matplotlib time                   # make bench: the plot, peak memory
   clang libclang-rt-dev  # libFuzzer: the fuzz targets of tests/host
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
+  binutils                                  # strip: the private runtime's native files
 )
 
 if ! dpkg --print-foreign-architectures | grep -qx i386; then

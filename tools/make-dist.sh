@@ -1,7 +1,8 @@
 #!/usr/bin/env bash
 # Lays out the built launchers as application directories under dist/.
 #   make-dist.sh linux BUILD OUT     OUT/linux-x86_64: the launcher, emu57.jar (the demo application)
-#                                    and jre/ (a private runtime made with jlink); ready to copy and run
+#                                    and jre/ (a private runtime made with jlink, trained with the demo
+#                                    for its class-data archive); ready to copy and run
 #   make-dist.sh windows BUILD OUT   OUT/<arch>: the launcher, jre\bin\client\jvm.dll, emu57.jar
 # No Windows Java runtime can be built here, so the Windows runtime slot holds the test stand-in VM
 # (tests/wine/vmdouble.cpp, which records what the launcher hands it in vm-record.txt and lets
@@ -14,8 +15,8 @@ case "$what" in
   linux)
     dir="$out/linux-x86_64"
     mkdir -p "$dir"
-    bash "$here/make-jre.sh" "$dir"
     bash "$here/build-demo-jar.sh" "$dir/emu57.jar"
+    bash "$here/make-jre.sh" "$dir" --app "$dir/emu57.jar"
     cp "$build/linux/launcher/QZ-Lumiscope_QZ-57" "$dir/"
     echo "$dir: $(ls "$dir" | tr '\n' ' ')" ;;
   windows)
