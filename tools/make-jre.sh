@@ -84,6 +84,7 @@ cleanup() {
   rm -rf "$tmp"
 }
 trap cleanup EXIT
+trap 'exit 130' INT TERM
 new=$tmp/jre
 if [ "$old" = 1 ]; then
   "$JDK/bin/jlink" --module-path "$JDK/jmods" --add-modules "$MODULES" \
@@ -103,7 +104,8 @@ else
   mkdir -p "$tmp/classes" "$tmp/home" "$tmp/lists" "$tmp/empty"
   "$JDK/bin/javac" --release 17 -d "$tmp/classes" "$training"/*.java
   "$JDK/bin/jar" --create --file "$tmp/training.jar" -C "$tmp/classes" .
-  Xvfb -displayfd 3 -screen 0 1280x1024x24 -nolisten tcp 3>"$tmp/display" 2>"$tmp/xvfb.log" & xvfb=$!
+  # Its output goes to a file: a caller reading ours must not wait on a server that outlived us.
+  Xvfb -displayfd 3 -screen 0 1280x1024x24 -nolisten tcp 3>"$tmp/display" >"$tmp/xvfb.log" 2>&1 & xvfb=$!
   for _ in $(seq 100); do [ -s "$tmp/display" ] && break; sleep 0.1; done
   [ -s "$tmp/display" ] || die "Xvfb did not start: $(tail -3 "$tmp/xvfb.log")"
   run=(env -i PATH=/usr/bin:/bin HOME="$tmp/home" LANG=C.UTF-8 DISPLAY=":$(tr -d '\n' <"$tmp/display")")
