@@ -2,7 +2,7 @@
 # what both platforms (wine.py: a Windows build under Wine with the VM double; linux.py: the Linux
 # build with the real JVM) do alike.
 #
-# A platform offers app(runtime="double"|"none"|"noentry"|"dep", strings=True, vm={script}, suffix="",
+# A platform offers app(runtime="double"|"none"|"noentry"|"dep"|"moved"|"foreign"|"truncated", strings=True, vm={script}, suffix="",
 # altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running (.wait_main(),
 # .stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
 # cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
@@ -14,7 +14,8 @@
 # exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw=1.
 # vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
 # JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
-# (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
+# (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not;
+# Linux also "vm TEXT", the VM's java.vm.info ("..., sharing" when it maps its class-data archive).
 import itertools
 import shutil
 import socket
@@ -38,8 +39,8 @@ def hexed(text):  # four hex digits per UTF-16 unit: how main and the hand-off g
 class Record:
     def __init__(self, data):
         self.lines = data.decode("latin-1").splitlines()
-        self.options, self.calls, self.args = ([line[len(head):] for line in self.lines if line.startswith(head)]
-                                               for head in ("option ", "call ", "arg "))
+        self.options, self.calls, self.args, self.vm = ([line[len(head):] for line in self.lines if line.startswith(head)]
+                                                        for head in ("option ", "call ", "arg ", "vm "))
 
 
 class App:

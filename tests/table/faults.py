@@ -8,7 +8,7 @@ import subprocess
 import sys
 from pathlib import Path
 
-FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launcher/, old, new)]
+FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launcher/ or tools/..., old, new)]
     ("upper-case hex digits", "linux", "arguments-encoded or hand-off-arguments",
      [("jvm/encode_argument.cpp", '"0123456789abcdef"', '"0123456789ABCDEF"')]),
     ("empty argument not repeating the previous one", "linux", "arguments-encoded or hand-off-arguments",
@@ -55,6 +55,15 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launch
      [("instance/instance_posix.cpp", "O_RDWR | O_CREAT | O_CLOEXEC, 0600", "O_RDWR | O_CREAT, 0600")]),
     ("overlong UTF-8 accepted", "linux", "arguments-as-bytes",
      [("core/text_posix.cpp", "c < 0x80 ? 1 : c < 0xC2 ? 0", "c < 0x80 ? 1 : c < 0xC0 ? 0")]),
+    ("the archive holding the training application's classes", "linux", "archive",
+     [("tools/make-jre.sh", "($1 in have) && !seen[$1]++", "!seen[$1]++"),
+      ("tools/make-jre.sh", "-Xmx256m -Xshare:dump", '-Xmx256m -Xshare:dump -cp "$app"')]),
+    ("the runtime made to require its archive", "linux", "archive",
+     [("tools/make-jre.sh", "--compress=$COMPRESS --output", "--compress=$COMPRESS --add-options=-Xshare:on --output"),
+      ("tools/make-jre.sh", '-XX:DumpLoadedClassList="$list"', '-Xshare:auto -XX:DumpLoadedClassList="$list"')]),
+    ("the runtime's native files not stripped", "linux", "runtime_made", [("tools/make-jre.sh", 'strip "$file" ;;', ': ;;')]),
+    ("the application jar left out of the runtime's inputs", "linux", "runtime_made",
+     [("tools/make-jre.sh", '"$training"/*.java ${app:+"$app"}', '"$training"/*.java')]),
 ]
 BUILDS = {"linux": ("linux", [], ["launcher"]),
           "wine": ("x86_64", ["-DCMAKE_TOOLCHAIN_FILE={scratch}/cmake/toolchain-x86_64-w64-mingw32.cmake"],
@@ -82,7 +91,7 @@ def main(names, scratch=Path("/tmp/planted-faults")):
         folder, _, targets = BUILDS[platform]
         originals = {}
         for file, old, new in edits:
-            path = scratch / "launcher" / file
+            path = scratch / (file if file.startswith("tools/") else "launcher/" + file)
             text = path.read_text()
             originals.setdefault(path, text)
             assert text.count(old) == 1, f"{name}: {old!r} does not occur once in {file}"

@@ -188,7 +188,12 @@ class Platform(conftest.Platform):
         self.build, self.state = (ROOT / build / "linux").resolve(), Path(tempfile.mkdtemp(prefix="qz57-table."))
         self.home, self.run_dir = self.state / "home", self.state / "run"
         super().__init__(f"linux-{arch}", self.state / "apps", self.home / "Documents", "/")
-        subprocess.run(["bash", ROOT / "tools/make-jre.sh", self.build / "table"], check=True, capture_output=True)
+        # The runtime as the application folder gets it: trained with the demo application, while every
+        # row runs the test application, another emu57.jar.
+        subprocess.run(["bash", ROOT / "tools/build-demo-jar.sh", self.build / "table/demo.jar"], check=True, capture_output=True)
+        subprocess.run(["bash", ROOT / "tools/make-jre.sh", self.build / "table", "--app", self.build / "table/demo.jar"],
+                       check=True, capture_output=True)
+        self.runtime = self.build / "table/jre"
         nomain = self.state / "nomain/com/qz/kpo/emu57/app/ApplicationMainForm.java"  # a main class without main
         nomain.parent.mkdir(parents=True)
         nomain.write_text("package com.qz.kpo.emu57.app;\npublic class ApplicationMainForm {}\n")
@@ -222,7 +227,15 @@ class Platform(conftest.Platform):
         (path / EXE).chmod(0o755)
         (path / "emu57.jar").write_bytes((self.state / jar / jar).read_bytes() if jar else b"")
         if runtime == "double":
-            (path / "jre").symlink_to(self.build / "table/jre")
+            (path / "jre").symlink_to(self.runtime)
+        elif runtime in ("moved", "foreign", "truncated"):  # a copy in another folder, with new file times, as installers make it
+            shutil.copytree(self.runtime, path / "jre", symlinks=True, copy_function=shutil.copy)
+            archive = path / "jre/lib/server/classes.jsa"
+            if runtime == "foreign":  # the archive of Debian's full JDK: another module set
+                archive.unlink()
+                shutil.copy(JDK.parent / "lib/server/classes.jsa", archive)
+            elif runtime == "truncated":  # a copy cut short
+                os.truncate(archive, archive.stat().st_size // 2)
         elif runtime == "noentry":
             shutil.copytree(self.state / "noentry", path / "jre/lib/server")
         return conftest.App(path, str(path), str(path / EXE))

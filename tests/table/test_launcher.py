@@ -5,11 +5,17 @@
 # splash (seen or not; when seen, up at every box, centred, fading in); options ("fixed" and
 # "folders" stand for the platform's lists); main_args (what main got, decoded); calls (JNI calls,
 # Windows double); vm_loaded (anything in the VM record); log ((message, code) lines after the start
-# line, "end"; [] no file); received (bytes on 6152: one connection, closed by the sender); stdout.
+# line, "end"; [] no file); received (bytes on 6152: one connection, closed by the sender); stdout;
+# sharing (the VM mapped the runtime's class-data archive, as the application reads it).
 import os
 import re
+import shutil
+import subprocess
 import time
+import zipfile
 from pathlib import Path
+
+import pytest
 
 from conftest import Listener, hexed, port_free
 
@@ -84,6 +90,14 @@ ROWS = [
         only="linux"),
     Row("system-exit-in-main", ["-noSplash"], app=dict(vm=dict(exit=42)), code=42, boxes=[], log=START),
     Row("runtime-needs-its-bin-folder", ["-noSplash"], app=dict(runtime="dep"), boxes=[destroyed(0)], only="wine"),
+    # The runtime's class-data archive: used from a copy of the runtime in another folder, with another
+    # emu57.jar than the one it was trained with; one that does not fit the runtime (another module
+    # set, a copy cut short) is ignored, and the application starts as without one.
+    Row("archive-used-moved", ["-noSplash"], app=dict(runtime="moved"), sharing=True, main_args=["-noSplash"], only="linux"),
+    Row("archive-foreign", ["-noSplash"], app=dict(runtime="foreign"), sharing=False, boxes=[destroyed(0)],
+        main_args=["-noSplash"], only="linux"),
+    Row("archive-truncated", ["x"], app=dict(runtime="truncated"), sharing=False, boxes=[destroyed(0)], main_args=["x"],
+        only="linux"),
 
     # The option list and the splash switch.
     Row("no-splash-twice", ["-noSplash", "file.qz57", "-noSplash"], options=["fixed", NO_SPLASH, NO_SPLASH, "folders"]),
@@ -200,6 +214,8 @@ def test_row(platform, row):
         assert out.listener.closed_by_sender or out.listener.drop_after
     if "stdout" in want:
         assert out.stdout == want["stdout"]
+    if "sharing" in want:
+        assert [info.endswith(", sharing") for info in out.record.vm] == [want["sharing"]], out.record.vm
     if out.windows:  # activation: the first ones qualify, the rest are near misses and stay as they were
         raised, missed = out.windows[:platform.raised], out.windows[platform.raised:]
         assert not any(w["iconic"] for w in raised) and raised[1]["zoomed"], "restored only when minimised"
@@ -235,3 +251,24 @@ def test_first_instance_holds_the_lock(platform):
     assert out.splash["t"] + 10000 <= out.splash["gone"] <= out.boxes[0].t and not out.boxes[0].splash
     assert check_log(out.log, START + END)
     assert platform.run(second_app, ["-noSplash"]).record.args == [hexed("-noSplash")]
+
+
+def test_runtime_made_for_its_application(platform, tmp_path):
+    # The private runtime (tools/make-jre.sh): every ELF file without a native symbol table (a package
+    # must not ship one) but with the dynamic symbols its loading needs; made again, with a new archive,
+    # once the application jar it was trained with changes, and left as it is while nothing changed.
+    if not getattr(platform, "runtime", None):
+        pytest.skip("the runtime slot holds the VM double")
+    elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.open("rb").read(4) == b"\x7fELF"]
+    sections = {f.name: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
+    assert len(elf) > 20 and {f for f, s in sections.items() if " .symtab " in s or " .dynsym " not in s} == set()
+    make = lambda out, jar: subprocess.run(["bash", Path(__file__).parents[2] / "tools/make-jre.sh", out, "--app", jar],
+                                           capture_output=True, text=True, check=True).stdout
+    made = platform.runtime.parent
+    assert "up to date" in make(made, made / "demo.jar")
+    shutil.copytree(made, tmp_path / "made", symlinks=True)
+    archive = (tmp_path / "made/jre/lib/server/classes.jsa").stat()
+    with zipfile.ZipFile(shutil.copy(made / "demo.jar", tmp_path), "a") as jar:  # a new build of the application
+        jar.writestr("build.txt", "2")
+    assert "made" in make(tmp_path / "made", tmp_path / "demo.jar")
+    assert (tmp_path / "made/jre/lib/server/classes.jsa").stat().st_ino != archive.st_ino
