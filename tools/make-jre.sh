@@ -40,9 +40,9 @@ JDK=/usr/lib/jvm/java-17-openjdk-amd64
 MODULES=java.desktop,java.management
 MAIN=com.qz.kpo.emu57.app.ApplicationMainForm
 # Modules stored uncompressed, by measurement (docs/performance.md): with the archive in place, zip
-# (--compress=2) brought the frame no sooner (0.99x for the demo, 1.01x for a program outside the training,
-# 21 alternating rounds), took 2.3 MiB more memory for the latter (the classes it inflates), and made the
-# runtime's share of the Debian package 31.0 MiB instead of 20.3 (zip-compressed data compresses worse
+# (--compress=2) brought the frame no sooner (1.00x for the demo, 1.01x for a program outside the training,
+# 21 alternating rounds), took about 2 MiB more memory for the latter (the classes it inflates), and made
+# the runtime's share of the Debian package 31.0 MiB instead of 20.3 (zip-compressed data compresses worse
 # again); it saves 24.5 MiB on disk (67.9 against 92.4 MiB). The package is what every user downloads.
 COMPRESS=0
 
@@ -86,12 +86,9 @@ cleanup() {
 trap cleanup EXIT
 trap 'exit 130' INT TERM
 new=$tmp/jre
-if [ "$old" = 1 ]; then
-  "$JDK/bin/jlink" --module-path "$JDK/jmods" --add-modules "$MODULES" \
-    --strip-debug --no-header-files --no-man-pages --compress=2 --output "$new"
-else
-  "$JDK/bin/jlink" --module-path "$JDK/jmods" --add-modules "$MODULES" \
-    --strip-debug --no-header-files --no-man-pages --compress=$COMPRESS --output "$new"
+"$JDK/bin/jlink" --module-path "$JDK/jmods" --add-modules "$MODULES" \
+  --strip-debug --no-header-files --no-man-pages --compress=$((old ? 2 : COMPRESS)) --output "$new"
+if [ "$old" = 0 ]; then
   command -v strip >/dev/null || die "strip not found: install Debian's binutils"
   command -v Xvfb >/dev/null || die "Xvfb not found: install Debian's xvfb"
   while IFS= read -r -d '' file; do
