@@ -25,6 +25,7 @@ BASE_PKGS=(
   clang libclang-rt-dev  # libFuzzer: the fuzz targets of tests/host
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
   binutils                                  # strip: the private runtime's native files
+  openjdk-17-jre                            # make bench: Debian's own java with Swing, beside the launcher
 )
 
 if ! dpkg --print-foreign-architectures | grep -qx i386; then
