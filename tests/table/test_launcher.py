@@ -256,19 +256,25 @@ def test_first_instance_holds_the_lock(platform):
 def test_runtime_made_for_its_application(platform, tmp_path):
     # The private runtime (tools/make-jre.sh): every ELF file without a native symbol table (a package
     # must not ship one) but with the dynamic symbols its loading needs; made again, with a new archive,
-    # once the application jar it was trained with changes, and left as it is while nothing changed.
+    # once the application jar it was trained with changes, and left as it is while nothing changed; a
+    # training run that fails fails the whole run and leaves the runtime made before in place.
     if not getattr(platform, "runtime", None):
         pytest.skip("the runtime slot holds the VM double")
     elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.open("rb").read(4) == b"\x7fELF"]
     sections = {f.name: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
     assert len(elf) > 20 and {f for f, s in sections.items() if " .symtab " in s or " .dynsym " not in s} == set()
     make = lambda out, jar: subprocess.run(["bash", Path(__file__).parents[2] / "tools/make-jre.sh", out, "--app", jar],
-                                           capture_output=True, text=True, check=True).stdout
-    made = platform.runtime.parent
-    assert "up to date" in make(made, made / "demo.jar")
+                                           capture_output=True, text=True)
+    made, archive = platform.runtime.parent, tmp_path / "made/jre/lib/server/classes.jsa"
+    assert "up to date" in make(made, made / "demo.jar").stdout
     shutil.copytree(made, tmp_path / "made", symlinks=True)
-    archive = (tmp_path / "made/jre/lib/server/classes.jsa").stat()
+    before = archive.stat().st_ino
     with zipfile.ZipFile(shutil.copy(made / "demo.jar", tmp_path), "a") as jar:  # a new build of the application
         jar.writestr("build.txt", "2")
-    assert "made" in make(tmp_path / "made", tmp_path / "demo.jar")
-    assert (tmp_path / "made/jre/lib/server/classes.jsa").stat().st_ino != archive.st_ino
+    assert "made" in make(tmp_path / "made", tmp_path / "demo.jar").stdout and archive.stat().st_ino != before
+    before = archive.stat().st_ino
+    with zipfile.ZipFile(tmp_path / "broken.jar", "w") as jar:
+        jar.writestr("com/qz/kpo/emu57/app/ApplicationMainForm.class", b"not a class")
+    broken = make(tmp_path / "made", tmp_path / "broken.jar")
+    assert broken.returncode and "training with com.qz.kpo.emu57.app.ApplicationMainForm" in broken.stderr, broken.stderr
+    assert archive.stat().st_ino == before
