@@ -89,8 +89,7 @@ new=$tmp/jre
 "$JDK/bin/jlink" --module-path "$JDK/jmods" --add-modules "$MODULES" \
   --strip-debug --no-header-files --no-man-pages --compress=$((old ? 2 : COMPRESS)) --output "$new"
 if [ "$old" = 0 ]; then
-  command -v strip >/dev/null || die "strip not found: install Debian's binutils"
-  command -v Xvfb >/dev/null || die "Xvfb not found: install Debian's xvfb"
+  for tool in strip:binutils Xvfb:xvfb; do command -v "${tool%:*}" >/dev/null || die "${tool%:*} not found: install Debian's ${tool#*:}"; done
   while IFS= read -r -d '' file; do
     [ "$(head -c 4 "$file" | od -An -c | tr -d ' ')" = '177ELF' ] || continue
     case $file in *.so) strip --strip-unneeded "$file" ;; *) strip "$file" ;; esac
@@ -111,8 +110,7 @@ if [ "$old" = 0 ]; then
     # Ready once it announces itself: Java's toolkit asks which window manager runs when it starts.
     for _ in $(seq 100); do "${run[@]}" xprop -root _NET_SUPPORTING_WM_CHECK 2>/dev/null | grep -q 'window id' && break; sleep 0.1; done
   fi
-  programs=("$tmp/training.jar Workbench")
-  if [ -n "$app" ]; then programs+=("$app $MAIN"); fi
+  programs=("$tmp/training.jar Workbench" ${app:+"$app $MAIN"})
   for program in "${programs[@]}"; do
     read -r jar class <<<"$program"
     list=$tmp/lists/$(basename "$jar")-$class
