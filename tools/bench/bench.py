@@ -50,7 +50,7 @@ def build(a):
     if not os.path.exists(f'{jre}/lib/server/libjvm.so') or not os.path.exists(demo):
         sys.exit(f'bench: no runtime at {jre} or no demo application beside it: run make dist-linux first')
     sh('bash', f'{ROOT}/tools/make-jre.sh', f'{b}/old-runtime', '--old')
-    a.runtimes = [jre, f'{b}/old-runtime/jre']
+    a.runtimes = [jre, os.path.abspath(f'{b}/old-runtime/jre')]
     folders = {'app': (f'{b}/bench.jar', jre), 'nojre': (f'{b}/bench.jar', None)}  # nojre: stops before the VM
     for program, jar in [('demo', demo), ('other', f'{b}/frame.jar')]:
         for n, runtime in enumerate(a.runtimes):
@@ -123,31 +123,21 @@ class Screen:
         for p in filter(None, [self.watch, self.server]):
             p.kill(), p.wait()
 
-def map_time(screen, argv, env, size):
-    """Process start to the first window of `size` (None: any) mapped; the process is then ended."""
+def map_time(screen, argv, env, wanted, peak=False):
+    """Process start to the first window mapped whose (width, height, class) is `wanted` (None when none
+    came); with `peak`, also the process's peak memory (MiB) once that window has been up for SETTLE_S.
+    The process is then ended."""
     while not screen.maps.empty():
         screen.maps.get()
     start, pid = spawn(argv, env)
     try:
-        return (screen.mapped(lambda w, h, cls: size in (None, (w, h))) - start) / 1e6
-    except queue.Empty:
-        return None
-    finally:
-        os.kill(pid, signal.SIGKILL)
-        finish(pid)
-
-def frame_run(screen, argv, env):
-    """Process start to the Java frame mapped (ms), and the process's peak memory (MiB) once the frame has
-    been up for SETTLE_S; the process is then ended."""
-    while not screen.maps.empty():
-        screen.maps.get()
-    start, pid = spawn(argv, env)
-    try:
-        ms = (screen.mapped(lambda w, h, cls: cls == JAVA_FRAME) - start) / 1e6
+        ms = (screen.mapped(wanted) - start) / 1e6
+        if not peak:
+            return ms
         time.sleep(SETTLE_S)
         return ms, int(re.search(r'VmHWM:\s*(\d+)', open(f'/proc/{pid}/status').read())[1]) / 1024
     except queue.Empty:
-        sys.exit(f'bench: no Java frame from {argv[0]} within 30 s')
+        return None
     finally:
         os.kill(pid, signal.SIGKILL)
         finish(pid)
@@ -215,8 +205,8 @@ def pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out
         order = (0, 1) if i % 2 == 0 else (1, 0)  # who goes first alternates too
         for who in order:
             for name, run in [
-                ('splash', lambda: map_time(screen, [launcher] if who == 0 else
-                                            [f'{a.work}/baseline_window', *a.splash_size], xenv, size)),
+                ('splash', lambda: map_time(screen, [launcher] if who == 0 else [f'{a.work}/baseline_window', *a.splash_size],
+                                            xenv, lambda *window: window[:2] == size)),
                 ('wine', lambda: wine and wine.map_time(who)),
                 ('main', lambda: java_run([launcher] if who == 0 else java, headless, out)),
                 ('prevm', lambda: java_run([launcher] if who == 0 else java, headless, out,
@@ -235,7 +225,8 @@ def pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out
                     R[name][who].append(v)
         for program, series in a.frames.items():  # three series: who goes first turns round
             for who in [(i + k) % len(series) for k in range(len(series))]:
-                ms, mib = frame_run(screen, series[who], xenv)
+                ms, mib = map_time(screen, series[who], xenv, lambda *window: window[2] == JAVA_FRAME, peak=True) or \
+                    sys.exit(f'bench: no Java frame from {series[who][0]} within 30 s')
                 R[f'frame_{program}'][who].append(ms)
                 R[f'rss_{program}'][who].append(mib)
         print(f'bench: pair {i + 1}/{a.pairs} done', file=sys.stderr, flush=True)
@@ -267,7 +258,7 @@ class Wine:
         self.argv = [[WINE, exe], [WINE, base, *a.splash_size]]
 
     def map_time(self, who):
-        return map_time(self.screen, self.argv[who], self.env, None)
+        return map_time(self.screen, self.argv[who], self.env, lambda *window: True)
 
     def close(self):
         self.screen.close()
