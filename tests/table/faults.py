@@ -63,6 +63,8 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k), [(file under launch
      [("tools/make-jre.sh", "--no-man-pages --compress", "--no-man-pages --add-options=-Xshare:on --compress"),
       ("tools/make-jre.sh", '-XX:DumpLoadedClassList="$list"', '-Xshare:auto -XX:DumpLoadedClassList="$list"')]),
     ("the runtime's native files not stripped", "linux", "runtime_made", [("tools/make-jre.sh", 'strip "$file" ;;', ': ;;')]),
+    ("the runtime trained with the application alone", "linux", "runtime_made",
+     [("tools/make-jre.sh", '"$tmp/training.jar Workbench" ${app', '${app')]),
     ("the application jar left out of the runtime's inputs", "linux", "runtime_made",
      [("tools/make-jre.sh", '"$training"/*.java ${app:+"$app"}', '"$training"/*.java')]),
 ]

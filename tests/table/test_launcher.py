@@ -93,7 +93,8 @@ ROWS = [
     # The runtime's class-data archive: used from a copy of the runtime in another folder, with another
     # emu57.jar than the one it was trained with; one that does not fit the runtime (another module
     # set, a copy cut short) is ignored, and the application starts as without one.
-    Row("archive-used-moved", ["-noSplash"], app=dict(runtime="moved"), sharing=True, main_args=["-noSplash"], only="linux"),
+    Row("archive-used-moved", ["-noSplash"], app=dict(runtime="moved", suffix="-\u00fc\u0416\u6587"), sharing=True,
+        main_args=["-noSplash"], only="linux"),
     Row("archive-foreign", ["-noSplash"], app=dict(runtime="foreign"), sharing=False, boxes=[destroyed(0)],
         main_args=["-noSplash"], only="linux"),
     Row("archive-truncated", ["x"], app=dict(runtime="truncated"), sharing=False, boxes=[destroyed(0)], main_args=["x"],
@@ -254,12 +255,20 @@ def test_first_instance_holds_the_lock(platform):
 
 
 def test_runtime_made_for_its_application(platform, tmp_path):
-    # The private runtime (tools/make-jre.sh): every ELF file without a native symbol table (a package
-    # must not ship one) but with the dynamic symbols its loading needs; made again, with a new archive,
-    # once the application jar it was trained with changes, and left as it is while nothing changed; a
-    # training run that fails fails the whole run and leaves the runtime made before in place.
+    # The private runtime (tools/make-jre.sh): its archive valid, dumped without a class path, holding the
+    # runtime's own classes only (the boot loader's), among them those of every training program's
+    # windows; every ELF file without a native symbol table (a package must not ship one) but with the
+    # dynamic symbols its loading needs; made again, with a new archive, once the application jar it was
+    # trained with changes, and left as it is while nothing changed; a training run that fails fails the
+    # whole run and leaves the runtime made before in place.
     if not getattr(platform, "runtime", None):
         pytest.skip("the runtime slot holds the VM double")
+    shared = subprocess.run([platform.runtime / "bin/java", "-XX:+PrintSharedArchiveAndExit", "-XX:+PrintSharedDictionary"],
+                            cwd=tmp_path, capture_output=True, text=True).stdout
+    classes = dict(line.split()[1:3] for line in shared.splitlines() if re.match(r" *\d+: ", line))
+    assert "archive is valid" in shared and re.search(r"Expecting -Djava\.class\.path=$", shared, re.M)
+    assert set(classes.values()) == {"boot_loader"} and {f"javax.swing.{name}" for name in (
+        "JList", "JMenuBar", "JTree", "JTable", "JTextArea", "JOptionPane", "JFileChooser")} <= classes.keys()
     elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.open("rb").read(4) == b"\x7fELF"]
     sections = {f.name: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
     assert len(elf) > 20 and {f for f, s in sections.items() if " .symtab " in s or " .dynsym " not in s} == set()
