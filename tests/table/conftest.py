@@ -2,12 +2,12 @@
 # what both platforms (wine.py: a Windows build under Wine with the VM double; linux.py: the Linux
 # build with the real JVM) do alike.
 #
-# A platform offers app(runtime="double"|"none"|"noentry"|"dep"|"moved"|"foreign"|"truncated", strings=True, vm={script}, suffix="",
-# altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running (.wait_main(),
-# .stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs: argv0,
-# cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
-# unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
-# long old log first, "nofolder", "keep"); Linux also display=False.
+# A platform offers app(runtime="double"|"none"|"noentry"|"dep"|"moved"|"foreign"|"truncated", strings=True,
+# vm={script}, suffix="", altered=False) -> App; run(app, args, **inputs) -> outcome; start(...) -> Running
+# (.wait_main(), .stop(), .finish() -> outcome); read_log(); fixed_options(app_dir); folder_options(). Inputs:
+# argv0, cwd="app", lock (another instance holds the lock), listener (a Listener), folders ({name: path, None:
+# unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a long
+# old log first, "nofolder", "keep"); Linux also display=False.
 #
 # vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
 # missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
