@@ -27,6 +27,8 @@ BASE_PKGS=(
   dpkg-dev nsis                             # make package: dpkg-shlibdeps for the Debian package, makensis
   lintian appstream desktop-file-utils      # the package checks
   debootstrap libglib2.0-bin xdg-utils      # a minimal Debian 12 to install into; the desktop's opener
+  binutils                                  # strip: the private runtime's native files
+  openjdk-17-jre                            # make bench: Debian's own java with Swing, beside the launcher
 )
 
 if ! dpkg --print-foreign-architectures | grep -qx i386; then

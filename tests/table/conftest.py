@@ -9,14 +9,17 @@
 # unusable}), windows [(state, class, title)], debug, splash (boxes wait for a splash), log ("junk": a
 # long old log first, "nofolder", "keep"), timeout; Linux also display=False|"silent" (never answers),
 # lock_folder ("foreign", "link"), settings="fifo", closed (standard streams), limits ({"nofile": N,
-# "address_space": BYTES}), env (more variables); app(runtime="fifo"|"cut:N") (libjvm.so cut to N bytes).
+# "address_space": BYTES}), env (more variables); app(runtime="fifo"|"cut:N") (libjvm.so cut to N bytes,
+# a negative N: N bytes short) and runtime="moved"|"foreign"|"truncated" (a copy of the runtime in the
+# application folder; with Debian's JDK's class-data archive; with its own archive cut short).
 #
 # vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
 # missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
 # exit=N (System.exit), destroy=N (DestroyJavaVM result); Linux also throw=1, say=1 (prints on both streams).
 # vm-record.txt beside it, one line each, texts as the VM got them: "option TEXT"; "call NAME ..." per
 # JNI call (the Windows double; " -> null" when scripted to fail); "main N" then "arg TEXT" per
-# (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not.
+# (encoded) element; "end" when main returns; "trap" when the launcher used a function it must not;
+# Linux also "vm TEXT", the VM's java.vm.info ("..., sharing" when it maps its class-data archive).
 import itertools
 import shutil
 import socket
@@ -39,8 +42,8 @@ def hexed(text):  # four hex digits per UTF-16 unit: how main and the hand-off g
 class Record:
     def __init__(self, data):
         self.lines = data.decode("latin-1").splitlines()
-        self.options, self.calls, self.args = ([line[len(head):] for line in self.lines if line.startswith(head)]
-                                               for head in ("option ", "call ", "arg "))
+        self.options, self.calls, self.args, self.vm = ([line[len(head):] for line in self.lines if line.startswith(head)]
+                                                        for head in ("option ", "call ", "arg ", "vm "))
 
 
 class App:

@@ -1,5 +1,5 @@
-# Planted faults: small patches to the launcher, each of which some rows of the table (or the host
-# tests' table) must catch.
+# Planted faults: small patches to the launcher and to the private runtime's maker, each of which some
+# rows of the table (or the host tests' table) must catch.
 # tools/planted-faults.sh [NAME-PART...]   builds each (or those named) in a scratch copy (the Linux
 # build, x86_64 under Wine for Windows code, or the host tests), runs the rows that can reach it,
 # prints "N of N caught". Those rows must first pass on the unpatched copy, so that no fault counts as
@@ -13,7 +13,7 @@ import sys
 import tempfile
 from pathlib import Path
 
-FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run whole), [(file under launcher/, old, new)]
+FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run whole), [(file, old, new)]
     ("upper-case hex digits", "linux", "arguments-encoded or hand-off-arguments",
      [("text/encode_argument.cpp", '"0123456789abcdef"', '"0123456789ABCDEF"')]),
     ("empty argument not repeating the previous one", "linux", "arguments-encoded or hand-off-arguments",
@@ -90,11 +90,27 @@ FAULTS = [  # name, platform it is run on, rows (pytest -k; the host tests run w
       ("log/log_posix.cpp", "int LogPlatformWidenBytes(const char* text, int)", "int LogPlatformWidenBytes(const char*, int units)")]),
     ("a picture's rows not checked against its bytes", "host", "",
      [("splash/splash_bitmap.cpp", "if (stride != 0 && static_cast<uint64_t>(height) > pixelBytes / stride) return false;", "")]),
+    ("the archive holding the training application's classes", "linux", "archive",  # and checked with its class path
+     [("runtime/make-jre.sh", "($1 in have) && !seen[$1]++", "!seen[$1]++"),
+      ("runtime/make-jre.sh", "-Xmx256m -Xshare:dump", '-Xmx256m -Xshare:dump -cp "$app"'),
+      ("runtime/make-jre.sh", "-Xshare:on -version", '-Xshare:on -cp "$app" -version')]),
+    ("the runtime made to require its archive", "linux", "archive",
+     [("runtime/make-jre.sh", "--no-man-pages --compress", "--no-man-pages --add-options=-Xshare:on --compress"),
+      ("runtime/make-jre.sh", '-XX:DumpLoadedClassList="$list"', '-Xshare:auto -XX:DumpLoadedClassList="$list"')]),
+    ("the runtime's native files not stripped", "linux", "runtime_made", [("runtime/make-jre.sh", 'strip "$file" ;;', ': ;;')]),
+    ("the runtime trained with the application alone", "linux", "runtime_made",
+     [("runtime/make-jre.sh", '"$tmp/training.jar Workbench" ${app', '${app')]),
+    ("the application jar left out of the runtime's inputs", "linux", "runtime_made",
+     [("runtime/make-jre.sh", '"$training"/*.java ${app:+"$app"}', '"$training"/*.java')]),
 ]
 # Where each platform's plants are built and what is rebuilt per plant: a preset (CMakePresets.json)
 # and its targets.
-BUILDS = {"linux": ("linux", ["launcher"]), "wine": ("x86_64", ["launcher", "launcher_nostrings"]), "host": ("linux", ["units"])}
+BUILDS = {"linux": ("linux", ["launcher", "runtime"]), "wine": ("x86_64", ["launcher", "launcher_nostrings"]), "host": ("linux", ["units"])}
 ROOT = Path(__file__).resolve().parents[2]
+
+
+def source(tree, file):  # a plant's file: the private runtime's maker, else a file of the launcher
+    return tree / file if file.startswith("runtime/") else tree / "launcher" / file
 
 
 def stale(faults, tree=ROOT):
@@ -103,10 +119,10 @@ def stale(faults, tree=ROOT):
     for name, _, _, edits in faults:
         texts = {}
         for file, old, new in edits:
-            path = tree / "launcher" / file
+            path = source(tree, file)
             text = texts.setdefault(path, path.read_text() if path.exists() else None)
             if text is None or text.count(old) != 1:
-                problems.append(f"{name}: {old!r} stands {0 if text is None else text.count(old)} times in launcher/{file}, not once")
+                problems.append(f"{name}: {old!r} stands {0 if text is None else text.count(old)} times in {source(Path(), file)}, not once")
             else:
                 texts[path] = text.replace(old, new)
     return problems
@@ -146,7 +162,7 @@ def main(names):
         preset, targets = BUILDS[platform]
         originals = {}
         for file, old, new in edits:
-            path = scratch / "launcher" / file
+            path = source(scratch, file)
             originals.setdefault(path, path.read_text())
             path.write_text(path.read_text().replace(old, new))
         built = subprocess.run(["cmake", "--build", "--preset", preset, "--target", *targets], cwd=scratch, **quiet).returncode == 0

@@ -224,6 +224,9 @@ class Platform(conftest.Platform):
         self.build, self.state = (ROOT / build / "linux").resolve(), Path(tempfile.mkdtemp(prefix="qz57-table."))
         self.home = self.state / "home"
         super().__init__(f"linux-{arch}", self.state / "apps", self.home / "Documents", "/")
+        # The runtime as the application folder gets it, trained with the demo application, while every
+        # row runs the test application: another emu57.jar.
+        self.runtime, self.trained_with = self.build / "runtime/jre", self.build / "demo/emu57.jar"
         nomain = self.state / "nomain/com/qz/kpo/emu57/app/ApplicationMainForm.java"  # a main class without main
         nomain.parent.mkdir(parents=True)
         nomain.write_text("package com.qz.kpo.emu57.app;\npublic class ApplicationMainForm {}\n")
@@ -275,14 +278,22 @@ class Platform(conftest.Platform):
         (path / EXE).chmod(0o755)
         (path / "emu57.jar").write_bytes((self.state / jar / jar).read_bytes() if jar else b"")
         if runtime == "double":
-            (path / "jre").symlink_to(self.build / "runtime/jre")
+            (path / "jre").symlink_to(self.runtime)
+        elif runtime in ("moved", "foreign", "truncated"):  # a copy in another folder, with new file times, as installers make it
+            shutil.copytree(self.runtime, path / "jre", symlinks=True, copy_function=shutil.copy)
+            archive = path / "jre/lib/server/classes.jsa"
+            if runtime == "foreign":  # the archive of Debian's full JDK: another module set
+                archive.unlink()
+                shutil.copy(JDK.parent / "lib/server/classes.jsa", archive)
+            elif runtime == "truncated":  # a copy cut short
+                os.truncate(archive, archive.stat().st_size // 2)
         elif runtime == "noentry":
             shutil.copytree(self.state / "noentry", path / "jre/lib/server")
         elif runtime == "fifo":
             (path / "jre/lib/server").mkdir(parents=True)
             os.mkfifo(path / "jre/lib/server/libjvm.so")
         elif runtime.startswith("cut:"):  # the real library cut to N bytes (a negative N: N bytes short)
-            data = (self.build / "runtime/jre/lib/server/libjvm.so").read_bytes()
+            data = (self.runtime / "lib/server/libjvm.so").read_bytes()
             (path / "jre/lib/server").mkdir(parents=True)
             (path / "jre/lib/server/libjvm.so").write_bytes(data[:int(runtime[4:])])
         return conftest.App(path, str(path), str(path / EXE))

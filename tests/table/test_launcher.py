@@ -7,11 +7,16 @@
 # Windows double); vm_loaded (anything in the VM record); log ((message, code) lines after the start
 # line, "end"; [] no file); received (bytes on 6152: one connection, closed by the sender); stdout;
 # causes (Linux: the standard-error lines naming a failure's cause, each holding its text, in order;
-# none when not given).
+# none when not given); sharing (the VM mapped the runtime's class-data archive, as the application reads it).
 import os
 import re
+import shutil
+import subprocess
 import time
+import zipfile
 from pathlib import Path
+
+import pytest
 
 from conftest import Listener, hexed, port_free
 
@@ -87,6 +92,15 @@ ROWS = [
         causes=['Exception in thread "main" java.lang.IllegalStateException: asked to throw'], only="linux"),
     Row("system-exit-in-main", ["-noSplash"], app=dict(vm=dict(exit=42)), code=42, boxes=[], log=START),
     Row("runtime-needs-its-bin-folder", ["-noSplash"], app=dict(runtime="dep"), boxes=[destroyed(0)], only="wine"),
+    # The runtime's class-data archive: used from a copy of the runtime in another folder, with another
+    # emu57.jar than the one it was trained with; one that does not fit the runtime (another module
+    # set, a copy cut short) is ignored, and the application starts as without one.
+    Row("archive-used-moved", ["-noSplash"], app=dict(runtime="moved", suffix="-\u00fc\u0416\u6587"), sharing=True,
+        main_args=["-noSplash"], only="linux"),
+    Row("archive-foreign", ["-noSplash"], app=dict(runtime="foreign"), sharing=False, boxes=[destroyed(0)],
+        main_args=["-noSplash"], only="linux"),
+    Row("archive-truncated", ["x"], app=dict(runtime="truncated"), sharing=False, boxes=[destroyed(0)], main_args=["x"],
+        only="linux"),
 
     # The option list and the splash switch.
     Row("no-splash-twice", ["-noSplash", "file.qz57", "-noSplash"], options=["fixed", NO_SPLASH, NO_SPLASH, "folders"]),
@@ -231,6 +245,8 @@ def test_row(platform, row):
     if platform.name.startswith("linux"):
         causes = want.get("causes", [])
         assert len(out.causes) == len(causes) and all(c in line for c, line in zip(causes, out.causes)), out.causes
+    if "sharing" in want:
+        assert [info.endswith(", sharing") for info in out.record.vm] == [want["sharing"]], out.record.vm
     if out.windows:  # activation: the first ones qualify, the rest are near misses and stay as they were
         raised, missed = out.windows[:platform.raised], out.windows[platform.raised:]
         assert not any(w["iconic"] for w in raised) and raised[1]["zoomed"], "restored only when minimised"
@@ -266,3 +282,40 @@ def test_first_instance_holds_the_lock(platform):
     assert out.splash["t"] + 10000 <= out.splash["gone"] <= out.boxes[0].t and not out.boxes[0].splash
     assert check_log(out.log, START + END)
     assert platform.run(second_app, ["-noSplash"]).record.args == [hexed("-noSplash")]
+
+
+def test_runtime_made_for_its_application(platform, tmp_path):
+    # The private runtime (runtime/make-jre.sh): its archive valid, dumped without a class path, holding the
+    # runtime's own classes only (the boot loader's), among them those of every training program's
+    # windows; every ELF file without a native symbol table (a package must not ship one) but with the
+    # dynamic symbols its loading needs; made again, with a new archive, once the application jar it was
+    # trained with changes, and left as it is while nothing changed; a training run that fails fails the
+    # whole run and leaves the runtime made before in place.
+    if not getattr(platform, "runtime", None):
+        pytest.skip("the runtime slot holds the VM double")
+    shared = subprocess.run([platform.runtime / "bin/java", "-XX:+PrintSharedArchiveAndExit", "-XX:+PrintSharedDictionary"],
+                            cwd=tmp_path, capture_output=True, text=True).stdout
+    classes = dict(line.split()[1:3] for line in shared.splitlines() if re.match(r" *\d+: ", line))
+    assert "archive is valid" in shared and re.search(r"Expecting -Djava\.class\.path=$", shared, re.M)
+    assert set(classes.values()) == {"boot_loader"} and {f"javax.swing.{name}" for name in (
+        "JList", "JMenuBar", "JTree", "JTable", "JTextArea", "JOptionPane", "JFileChooser")} <= classes.keys()
+    elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.open("rb").read(4) == b"\x7fELF"]
+    sections = {f.name: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
+    assert len(elf) > 20 and {f for f, s in sections.items() if " .symtab " in s or " .dynsym " not in s} == set()
+    make = lambda out, jar: subprocess.run(["bash", Path(__file__).parents[2] / "runtime/make-jre.sh", out, "--app", jar],
+                                           capture_output=True, text=True)
+    made, archive = platform.runtime.parent, tmp_path / "made/jre/lib/server/classes.jsa"
+    assert "up to date" in make(made, platform.trained_with).stdout
+    (tmp_path / "made").mkdir()
+    shutil.copytree(platform.runtime, tmp_path / "made/jre", symlinks=True)
+    shutil.copy(made / ".jre-inputs", tmp_path / "made")
+    before = archive.stat().st_ino
+    with zipfile.ZipFile(shutil.copy(platform.trained_with, tmp_path / "demo.jar"), "a") as jar:  # a new build of the application
+        jar.writestr("build.txt", "2")
+    assert "made" in make(tmp_path / "made", tmp_path / "demo.jar").stdout and archive.stat().st_ino != before
+    before = archive.stat().st_ino
+    with zipfile.ZipFile(tmp_path / "broken.jar", "w") as jar:
+        jar.writestr("com/qz/kpo/emu57/app/ApplicationMainForm.class", b"not a class")
+    broken = make(tmp_path / "made", tmp_path / "broken.jar")
+    assert broken.returncode and "training with com.qz.kpo.emu57.app.ApplicationMainForm" in broken.stderr, broken.stderr
+    assert archive.stat().st_ino == before

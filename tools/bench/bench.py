@@ -2,10 +2,11 @@
 """Start-up benchmark of the launcher beside its alternatives, run as alternating pairs.
 
     python3 tools/bench/bench.py [--pairs 21] [--no-wine] [--out docs]
-Needs a built Linux launcher (build/linux), its runtime (make dist-linux), Debian's OpenJDK 17, Xvfb,
-python3-matplotlib and libx11-dev; under Wine also the x86_64 build. Prints the table and writes
-docs/performance.md and docs/performance.png. Not a test: nothing here passes or fails."""
-import argparse, datetime, string, fcntl, os, platform, pwd, queue, shutil, signal, socket, statistics, subprocess, sys, threading, time
+Needs a built Linux launcher (build/linux), its runtime and the demo application (make dist-linux),
+Debian's OpenJDK 17 (with openjdk-17-jre for its Swing), Xvfb, python3-matplotlib and libx11-dev; under
+Wine also the x86_64 build. Prints the table and writes docs/performance.md and docs/performance.png. Not
+a test: nothing here passes or fails."""
+import argparse, datetime, glob, string, fcntl, os, platform, pwd, queue, re, shutil, signal, socket, statistics, subprocess, sys, threading, time
 
 HERE = os.path.dirname(os.path.abspath(__file__))
 ROOT = os.path.dirname(os.path.dirname(HERE))
@@ -17,6 +18,9 @@ LOCKS = os.path.join(pwd.getpwuid(os.getuid()).pw_dir, '.cache')
 LOCK = f"QZ-Lumiscope_QZ-57/\u5a51\u4c2d\u6d75\u7369\u6f63\u6570\u515f\u2d5a\u3735@{os.uname().nodename.replace('/', '_')}.lock"
 HANDOFF_ARGS = ['/home/ana/Messungen/Probe \u00e9t\u00e9.l57', 'scan \U0001F600 02.l57']
 WINE = '/usr/lib/wine/wine64'
+JAVA_FRAME = 'com-qz-kpo-emu57-app-ApplicationMainForm'  # the class Java's toolkit gives the main class's windows
+SETTLE_S = 1.0  # the frame up and painted before its process's peak memory is read
+PACKAGE = 'dist/qz-lumiscope-qz57_*_amd64.deb'
 
 def reexec():
     """Runs again under Debian's python3 (matplotlib) in a private network namespace (port 6152) and a
@@ -45,15 +49,24 @@ def build(a):
     sh('cc', '-O2', '-shared', '-fPIC', '-o', f'{b}/vm_load_stamp.so', f'{HERE}/vm_load_stamp.c')
     sh(f'{JDK}/bin/javac', '--release', '17', '-d', f'{b}/classes', f'{HERE}/ApplicationMainForm.java')
     sh(f'{JDK}/bin/jar', '--create', '--file', f'{b}/bench.jar', '-C', f'{b}/classes', '.')
-    jre = os.path.abspath(a.jre)
-    if not os.path.exists(f'{jre}/lib/server/libjvm.so'):
-        sys.exit(f'bench: no runtime at {jre}: run make dist-linux first')
-    for d in [f'{b}/app', f'{b}/nojre']:  # the second has no runtime: the launcher stops before the VM
+    sh(f'{JDK}/bin/javac', '--release', '17', '-d', f'{b}/frame-classes', f'{HERE}/frame/ApplicationMainForm.java')
+    sh(f'{JDK}/bin/jar', '--create', '--file', f'{b}/frame.jar', '-C', f'{b}/frame-classes', '.')
+    jre, demo = os.path.abspath(a.jre), os.path.join(os.path.dirname(os.path.abspath(a.jre)), 'emu57.jar')
+    if not os.path.exists(f'{jre}/lib/server/libjvm.so') or not os.path.exists(demo):
+        sys.exit(f'bench: no runtime at {jre} or no demo application beside it: run make dist-linux first')
+    sh('bash', f'{ROOT}/runtime/make-jre.sh', f'{b}/old-runtime', '--old')
+    a.runtimes = [jre, os.path.abspath(f'{b}/old-runtime/jre')]
+    folders = {'app': (f'{b}/bench.jar', jre), 'nojre': (f'{b}/bench.jar', None)}  # nojre: stops before the VM
+    for program, jar in [('demo', demo), ('other', f'{b}/frame.jar')]:
+        for n, runtime in enumerate(a.runtimes):
+            folders[f'frame-{program}-{n}'] = (jar, runtime)
+    for name, (jar, runtime) in folders.items():
+        d = f'{b}/{name}'
         shutil.rmtree(d, ignore_errors=True)
         os.makedirs(d)
         shutil.copy2(a.launcher, f'{d}/{EXE}')
-        shutil.copy2(f'{b}/bench.jar', f'{d}/emu57.jar')
-    os.symlink(jre, f'{b}/app/jre')
+        shutil.copy2(jar, f'{d}/emu57.jar')
+        runtime and os.symlink(runtime, f'{d}/jre')
     if a.wine:
         sh('x86_64-w64-mingw32-gcc', '-O2', '-static', '-mwindows', '-o', f'{b}/baseline_window_win.exe',
            f'{HERE}/baseline_window_win.c')
@@ -100,27 +113,34 @@ class Screen:
 
     def read(self):
         for line in self.watch.stdout:
-            _, ns, w, h = line.split()
-            self.maps.put((int(ns), int(w), int(h)))
+            _, ns, w, h, cls = line.split()
+            self.maps.put((int(ns), int(w), int(h), cls))
 
-    def mapped(self, size, timeout=30):
+    def mapped(self, wanted, timeout=30):
+        """The time of the first window mapped whose (width, height, class) is `wanted`."""
         end = time.monotonic() + timeout
         while True:
-            ns, w, h = self.maps.get(timeout=max(0.01, end - time.monotonic()))
-            if size in (None, (w, h)):
+            ns, *window = self.maps.get(timeout=max(0.01, end - time.monotonic()))
+            if wanted(*window):
                 return ns
 
     def close(self):
         for p in filter(None, [self.watch, self.server]):
             p.kill(), p.wait()
 
-def map_time(screen, argv, env, size):
-    """Process start to the first window of `size` mapped; the process is then ended."""
+def map_time(screen, argv, env, wanted, peak=False):
+    """Process start to the first window mapped whose (width, height, class) is `wanted` (None when none
+    came); with `peak`, also the process's peak memory (MiB) once that window has been up for SETTLE_S.
+    The process is then ended."""
     while not screen.maps.empty():
         screen.maps.get()
     start, pid = spawn(argv, env)
     try:
-        return (screen.mapped(size) - start) / 1e6
+        ms = (screen.mapped(wanted) - start) / 1e6
+        if not peak:
+            return ms
+        time.sleep(SETTLE_S)
+        return ms, int(re.search(r'VmHWM:\s*(\d+)', open(f'/proc/{pid}/status').read())[1]) / 1024
     except queue.Empty:
         return None
     finally:
@@ -154,7 +174,7 @@ def handoff_time(listener, argv, env):
     return (last - start) / 1e6, data
 
 def measure(a):
-    R = {f[0]: ([], []) for f in FIGS}
+    R = {f[0]: [[] for _ in range(1 + len(f[3]))] for f in FIGS}
     for d in ['home/.config', 'home/Documents/QZ-LumiscopeQZ-57Nova/logs']:  # the launcher logs
         os.makedirs(f'{a.tmp}/{d}', mode=0o700)
     launcher, out = f'{a.work}/app/{EXE}', f'{a.tmp}/out.txt'
@@ -166,6 +186,10 @@ def measure(a):
     # The VM does not report the class path; the launcher's is the application folder's emu57.jar.
     java = [f'{a.jre}/bin/java', '-cp', f'{a.work}/app/emu57.jar'] + options + [MAIN]
     a.java = java
+    # The frames: the launcher with each runtime, and Debian's java of the full JDK with the same options.
+    a.frames = {program: [[f'{a.work}/frame-{program}-{n}/{EXE}'] for n in range(len(a.runtimes))] +
+                [[f'{JDK}/bin/java', '-cp', f'{a.work}/frame-{program}-0/emu57.jar'] + options + [MAIN]]
+                for program in ('demo', 'other')}
     screen = Screen(a)
     xenv = environment(a, DISPLAY=screen.display)
     size = tuple(int(v) for v in a.splash_size)
@@ -186,8 +210,8 @@ def pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out
         order = (0, 1) if i % 2 == 0 else (1, 0)  # who goes first alternates too
         for who in order:
             for name, run in [
-                ('splash', lambda: map_time(screen, [launcher] if who == 0 else
-                                            [f'{a.work}/baseline_window', *a.splash_size], xenv, size)),
+                ('splash', lambda: map_time(screen, [launcher] if who == 0 else [f'{a.work}/baseline_window', *a.splash_size],
+                                            xenv, lambda *window: window[:2] == size)),
                 ('wine', lambda: wine and wine.map_time(who)),
                 ('main', lambda: java_run([launcher] if who == 0 else java, headless, out)),
                 ('prevm', lambda: java_run([launcher] if who == 0 else java, headless, out,
@@ -204,6 +228,12 @@ def pairs(a, R, screen, wine, listener, xenv, size, headless, java, encoded, out
                     a.vm_part[who].append(v[0] - v[3])
                 elif v is not None:
                     R[name][who].append(v)
+        for program, series in a.frames.items():  # three series: who goes first turns round
+            for who in [(i + k) % len(series) for k in range(len(series))]:
+                ms, mib = map_time(screen, series[who], xenv, lambda *window: window[2] == JAVA_FRAME, peak=True) or \
+                    sys.exit(f'bench: no Java frame from {series[who][0]} within 30 s')
+                R[f'frame_{program}'][who].append(ms)
+                R[f'rss_{program}'][who].append(mib)
         print(f'bench: pair {i + 1}/{a.pairs} done', file=sys.stderr, flush=True)
 
 def handoff(a, listener, launcher, encoded, who, env):
@@ -234,22 +264,27 @@ class Wine:
         self.argv = [[WINE, exe], [WINE, base, *a.splash_size]]
 
     def map_time(self, who):
-        return map_time(self.screen, self.argv[who], self.env, None)
+        return map_time(self.screen, self.argv[who], self.env, lambda *window: True)
 
     def close(self):
         self.screen.close()
         sh('bash', f'{ROOT}/tests/wine/bed.sh', 'teardown', self.bed)
 
 SAME = "Debian's java, same runtime and options"
-FIGS = [  # key, what, unit, alternative, goal kind, goal
-    ('splash', 'start to splash window mapped, Linux on Xvfb', 'ms', 'baseline_window (bare Xlib window)', 'ratio', 1.10),
-    ('wine', 'start to splash window mapped, x86_64 under Wine', 'ms', 'baseline_window_win.exe', 'ratio', 1.10),
-    ('main', 'start to Java main entered', 'ms', SAME, 'ratio', 1.00),
-    ('end', 'start to process end', 'ms', SAME, 'ratio', 1.00),
-    ('link', 'exec and dynamic linking: start to the program\'s first code', 'ms', SAME, None, 0),
-    ('prevm', 'own work before the VM library: first code to the load of libjvm.so', 'ms', SAME, 'max', 2.0),
-    ('handoff', 'second instance: start to last byte received on 6152', 'ms', 'baseline_send (bare sender)', 'ratio', 1.20),
-    ('rss', 'peak resident memory, run stopped before the VM', 'MiB', None, 'max', 4.0),
+OLD, FULL = ('launcher, runtime made the old way', 'old runtime'), ("Debian's java -cp emu57.jar, full JDK", "Debian's java")
+FIGS = [  # key, what, unit, [(alternative, its label in the plot, goal of the ratio or None)], ceiling of the launcher's own figure
+    ('splash', 'start to splash window mapped, Linux on Xvfb', 'ms', [('baseline_window (bare Xlib window)', 'bare window', 1.10)], None),
+    ('wine', 'start to splash window mapped, x86_64 under Wine', 'ms', [('baseline_window_win.exe', 'bare window', 1.10)], None),
+    ('main', 'start to Java main entered', 'ms', [(SAME, 'java', 1.00)], None),
+    ('end', 'start to process end', 'ms', [(SAME, 'java', 1.00)], None),
+    ('link', 'exec and dynamic linking: start to the program\'s first code', 'ms', [(SAME, 'java', None)], None),
+    ('prevm', 'own work before the VM library: first code to the load of libjvm.so', 'ms', [(SAME, 'java', None)], 2.0),
+    ('handoff', 'second instance: start to last byte received on 6152', 'ms', [('baseline_send (bare sender)', 'bare sender', 1.20)], None),
+    ('rss', 'peak resident memory, run stopped before the VM', 'MiB', [], 4.0),
+    ('frame_demo', 'start to the Java frame mapped: the demo application', 'ms', [(*OLD, 0.75), (*FULL, 0.85)], None),
+    ('frame_other', 'start to the Java frame mapped: a frame program outside the training', 'ms', [(*OLD, 0.85), (*FULL, 0.92)], None),
+    ('rss_demo', 'peak resident memory with the frame up: the demo application', 'MiB', [(*OLD, 0.85), (*FULL, None)], None),
+    ('rss_other', 'peak resident memory with the frame up: the frame program outside the training', 'MiB', [(*OLD, None), (*FULL, None)], None),
 ]
 
 def stats(v):
@@ -257,22 +292,21 @@ def stats(v):
 
 def table(R):
     rows, missed = ['| figure | series | median | min | max | goal | met |', '|---|---|---:|---:|---:|---|---|'], []
-    for key, what, unit, alt, kind, goal in FIGS:
-        mine, other = R[key]
+    for key, what, unit, alts, ceiling in FIGS:
+        mine = R[key][0]
         if not mine:
             continue
-        series = [('launcher', mine, unit)] + ([(alt, other, unit)] if other else [])
-        if other:
-            series.append(('ratio launcher / alternative', [x / y for x, y in zip(mine, other)], 'x'))
-        for n, (name, v, u) in enumerate(series):
+        series = [('launcher', mine, unit, ceiling and (lambda m: m < ceiling, f'< {ceiling:g} {unit}'))]
+        for (alt, _, goal), other in zip(alts, R[key][1:]):
+            if other:
+                series += [(alt, other, unit, None), ('ratio launcher / alternative', [x / y for x, y in zip(mine, other)], 'x',
+                                                      goal and (lambda m, goal=goal: m <= goal, f'<= {goal:.2f}x'))]
+        for n, (name, v, u, goal) in enumerate(series):
             m = stats(v)
-            judged = (kind == 'ratio' and u == 'x') or (kind == 'max' and n == 0)
-            ok = m[0] <= goal if kind == 'ratio' else m[0] < goal
-            if judged and not ok:
-                missed.append(key)
-            g = (f'<= {goal:.2f}x' if kind == 'ratio' else f'< {goal:g} {unit}') if judged else ''
+            if goal and not goal[0](m[0]):
+                missed.append((key, name if u != 'x' else series[n - 1][0]))
             rows.append(f'| {what if n == 0 else ""} | {name} | ' + ' | '.join(f'{x:.2f} {u}' for x in m) +
-                        f' | {g} | {("met" if ok else "NOT met") if judged else ""} |')
+                        f' | {goal[1] if goal else ""} | {("met" if goal[0](m[0]) else "NOT met") if goal else ""} |')
     return '\n'.join(rows), missed
 
 def sizes(a):
@@ -283,6 +317,15 @@ def sizes(a):
         if os.path.exists(path):
             total, pic = os.path.getsize(path), (picture + pad - 1) // pad * pad
             rows.append(f'| {name} | {total:,} B ({total / 1024:.1f} KiB) | {pic:,} B | {total - pic:,} B ({(total - pic) / 1024:.1f} KiB) |')
+    mib = lambda n: f'{n:,} B ({n / 2 ** 20:.1f} MiB)'
+    folder = lambda d: sum(os.path.getsize(os.path.join(p, f)) for p, _, fs in os.walk(d) for f in fs)
+    package = sorted(glob.glob(f'{ROOT}/{PACKAGE}'))
+    rows += ['', '| Java runtime, package | size |', '|---|---:|',
+             f'| the private runtime (`{os.path.relpath(a.runtimes[0], ROOT)}`), its archive `lib/server/classes.jsa` '
+             f'{mib(os.path.getsize(a.runtimes[0] + "/lib/server/classes.jsa"))} | {mib(folder(a.runtimes[0]))} |',
+             f'| the runtime made the old way | {mib(folder(a.runtimes[1]))} |',
+             f'| the Debian package (`{PACKAGE}`) | ' + (f'{mib(os.path.getsize(package[-1]))}, {os.path.basename(package[-1])} |'
+                                                       if package else 'not built |')]
     return '\n'.join(rows)
 
 def plot(R, path):
@@ -290,22 +333,23 @@ def plot(R, path):
     matplotlib.use('Agg')
     import matplotlib.pyplot as plt
     figs = [f for f in FIGS if R[f[0]][0]]
-    cols = (len(figs) + 1) // 2
-    fig, axes = plt.subplots(2, cols, figsize=(3.2 * cols, 9), squeeze=False)
+    cols = (len(figs) + 2) // 3
+    fig, axes = plt.subplots(3, cols, figsize=(3.2 * cols, 13), squeeze=False)
     [ax.set_visible(False) for ax in axes.flat[len(figs):]]
-    for ax, (key, what, unit, alt, kind, goal) in zip(axes.flat, figs):
-        data = [v for v in R[key] if v]
-        ax.boxplot(data, labels=['launcher', 'alternative'][:len(data)], widths=0.5, showfliers=False)
-        for n, v in enumerate(data):
+    for ax, (key, what, unit, alts, ceiling) in zip(axes.flat, figs):
+        data = [(label, v) for label, v in zip(['launcher'] + [alt[1] for alt in alts], R[key]) if v]
+        ax.boxplot([v for _, v in data], labels=[label for label, _ in data], widths=0.5, showfliers=False)
+        for n, (_, v) in enumerate(data):
             ax.plot([n + 1 + 0.12 * ((i % 5) - 2) / 2 for i in range(len(v))], v, '.', alpha=0.6,
-                    color=['tab:blue', 'tab:orange'][n])
-        if kind == 'max':
-            ax.axhline(goal, color='tab:red', linestyle='--', label=f'goal < {goal:g} {unit}')
+                    color=['tab:blue', 'tab:orange', 'tab:green'][n])
+        if ceiling:
+            ax.axhline(ceiling, color='tab:red', linestyle='--', label=f'goal < {ceiling:g} {unit}')
             ax.legend(fontsize=7)
         ax.set_title('\n'.join(__import__('textwrap').wrap(what, 28)), fontsize=8)
         ax.set_ylabel(unit)
         ax.set_ylim(bottom=0)
         ax.tick_params(labelsize=7)
+        plt.setp(ax.get_xticklabels(), rotation=15)
     fig.tight_layout()
     fig.savefig(path, dpi=110)
 
@@ -316,16 +360,20 @@ def machine():
 
 def document(a, R, text, missed, size_text):
     med = lambda v: f'{statistics.median(v):.1f}' if v else '?'
-    notes = ''.join(f'- Not met in this run: {what}.\n' for key, what, *_ in FIGS if key in missed)
-    # $med_<figure>, $alt_<figure> (medians of the launcher and its alternative), $ratio_<figure>.
+    notes = ''.join(f'- Not met in this run: {what}' + (f', against {alt}' if len(alts) > 1 else '') + '.\n'
+                    for key, what, _, alts, _ in FIGS for k, alt in missed if k == key)
+    # $med_<figure>, $alt_<figure> and $alt2_<figure> (medians of the launcher and its alternatives),
+    # $ratio_<figure> and $ratio2_<figure>.
     figures = {f'med_{key}': f'{statistics.median(R[key][0]):.2f}' if R[key][0] else '?' for key, *_ in FIGS}
-    figures.update({f'alt_{key}': f'{statistics.median(R[key][1]):.2f}' if R[key][1] else '?' for key, *_ in FIGS})
-    figures.update({f'ratio_{key}': f'{statistics.median([x / y for x, y in zip(*R[key])]):.2f}'
-                    if R[key][0] and R[key][1] else '?' for key, *_ in FIGS})
+    for n, suffix in [(1, ''), (2, '2')]:
+        figures.update({f'alt{suffix}_{key}': f'{statistics.median(R[key][n]):.2f}' if R[key][n:n + 1] and R[key][n] else '?'
+                        for key, *_ in FIGS})
+        figures.update({f'ratio{suffix}_{key}': f'{statistics.median([x / y for x, y in zip(R[key][0], R[key][n])]):.2f}'
+                        if R[key][0] and R[key][n:n + 1] and R[key][n] else '?' for key, *_ in FIGS})
     return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(figures,
         command=a.command, date=datetime.date.today(), pairs=a.pairs, machine=machine(), table=text,
         netns='a private network namespace' if os.environ.get('BENCH_NETNS') == 'private' else 'the shared network',
-        picture=f'{os.path.getsize(a.bmp):,}', sizes=size_text, java=' '.join(a.java), vm_launcher=med(a.vm_part[0]),
+        picture=f'{os.path.getsize(a.bmp):,}', sizes=size_text, runtime=os.path.relpath(a.runtimes[0], ROOT), java=' '.join(a.java), vm_launcher=med(a.vm_part[0]),
         vm_java=med(a.vm_part[1]), prevm_launcher=med(R['prevm'][0]), link_launcher=med(R['link'][0]),
         missed=('\n## Goals not met\n' + notes) if notes else '')
 

@@ -8,7 +8,8 @@ import java.util.Properties;
 // The scenario table's Java application: records what the launcher gave it in vm-record.txt of the
 // current directory and behaves as vm-script.txt asks (the line formats are the VM double's, see
 // tests/table/conftest.py). The class path comes first, from its property: the VM keeps that option
-// out of the input arguments it reports.
+// out of the input arguments it reports. "vm" is the VM's own summary, which ends in "sharing" when it
+// maps its class-data archive.
 //   script keys: main_ms=N  until=NAME  exit=N  throw=1  say=1 (a line on standard output and error)
 public final class ApplicationMainForm {
     public static void main(String[] args) throws Exception {
@@ -19,6 +20,7 @@ public final class ApplicationMainForm {
         PrintStream record = new PrintStream(new FileOutputStream("vm-record.txt", true), true, "UTF-8");
         record.println("option -Djava.class.path=" + System.getProperty("java.class.path"));
         for (String option : ManagementFactory.getRuntimeMXBean().getInputArguments()) record.println("option " + option);
+        record.println("vm " + System.getProperty("java.vm.info"));
         record.println("main " + args.length);
         for (String arg : args) record.println("arg " + arg);
         if (script.getProperty("say") != null) {
