@@ -179,8 +179,10 @@ void ActivateOnDisplay() {
 // The walk runs in a child process, which is ended when it is not done in time: Xlib offers no
 // time-out of its own, and a thread stuck inside it could not be stopped. The child's end closes its
 // side of the pipe, which is what the wait looks for. A child whose parent is killed meanwhile goes
-// with it rather than wait on the display for good.
+// with it rather than wait on the display for good. Without a display (none named, or no libX11)
+// there is nothing to raise, and a headless second start starts no process.
 void ActivateRunningInstances() {
+    if (!LoadXlib()) return;
     int done[2];
     if (pipe2(done, O_CLOEXEC) != 0) return;
     pid_t parent = getpid();
