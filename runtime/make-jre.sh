@@ -36,7 +36,7 @@
 # the client VM's default archive, jre\bin\client\classes.jsa, which jvm.dll maps with no option.
 set -euo pipefail
 
-JDK=/usr/lib/jvm/java-17-openjdk-amd64
+JDK=${JDK:-/usr/lib/jvm/java-17-openjdk-amd64}  # the build passes its JAVA_HOME
 MODULES=java.desktop,java.management
 MAIN=com.qz.kpo.emu57.app.ApplicationMainForm
 # Modules stored uncompressed, by measurement (docs/performance.md): with the archive in place, zip
