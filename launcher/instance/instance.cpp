@@ -14,9 +14,6 @@ namespace {
 const char InstanceName[20] = "QZ-Lumiscope_QZ-57";
 enum { kInstanceNameBytes = 18 };
 
-// Titles are looked at up to this many UTF-16 units, as the Windows side asks WM_GETTEXT for.
-enum { kTitleUnits = 1024 };
-
 // The running application's frame class, as the class test compares with it.
 const char16_t FrameClassName[] = u"com.qz.kpo.emu57.app.EmulatorFrame";
 // Java's X11 toolkit names a frame's WM_CLASS after the main class, dots turned into dashes.

@@ -9,6 +9,8 @@
 
 // ---- The window tests (instance.cpp).
 
+// Titles are looked at up to this many UTF-16 units (what the Windows side asks WM_GETTEXT for).
+enum { kTitleUnits = 1024 };
 // The title test: the title's UTF-16LE bytes, read as an 8-bit string up to their first zero byte,
 // hold the 18 bytes of the instance name. Byte-wise and case-sensitive on purpose.
 bool TitleHoldsInstanceName(const char16_t* title);

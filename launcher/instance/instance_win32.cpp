@@ -22,8 +22,7 @@
 namespace {
 
 // Title and class buffers of the window test, in UTF-16 units. WM_GETTEXT is asked for at most
-// 1,024 characters and GetClassNameW for at most 2,048, so each buffer holds what it may be given.
-const int kTitleUnits = 1024;
+// kTitleUnits characters and GetClassNameW for at most 2,048, so each buffer holds what it may be given.
 const int kClassUnits = 2048;
 
 }  // namespace

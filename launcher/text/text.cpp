@@ -25,7 +25,10 @@ char* NarrowCopy(const char16_t* text) {
     if (size <= 0) return nullptr;
     char* copy = static_cast<char*>(malloc(static_cast<size_t>(size) + 1));
     if (copy == nullptr) return nullptr;
-    if (ToNarrow(text, copy, size + 1) == 0) return nullptr;
+    if (ToNarrow(text, copy, size + 1) == 0) {
+        free(copy);
+        return nullptr;
+    }
     return copy;
 }
 
@@ -34,6 +37,9 @@ char16_t* WideCopy(const char* text) {
     if (size <= 0) return nullptr;
     char16_t* copy = static_cast<char16_t*>(malloc((static_cast<size_t>(size) + 1) * sizeof(char16_t)));
     if (copy == nullptr) return nullptr;
-    if (ToWide(text, -1, copy, size + 1) == 0) return nullptr;
+    if (ToWide(text, -1, copy, size + 1) == 0) {
+        free(copy);
+        return nullptr;
+    }
     return copy;
 }

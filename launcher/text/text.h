@@ -26,8 +26,8 @@ int WideSize(const char* text);
 int ToNarrow(const char16_t* text, char* out, int outBytes);
 int ToWide(const char* text, int sourceBytes, char16_t* out, int outUnits);
 
-// Heap copy of `text` in the other encoding, or null when the conversion fails. Never released by
-// the launcher (its log and VM option texts live until the process ends).
+// Heap copy of `text` in the other encoding (malloc: the caller frees it, unless it lives until the
+// process ends, as the log's and the VM options' texts do), or null when the conversion fails.
 char* NarrowCopy(const char16_t* text);
 char16_t* WideCopy(const char* text);
 
