@@ -1,6 +1,6 @@
 #!/usr/bin/env bash
 # Prepares the minimal Debian 12 in which the package tests install our Debian package:
-#   tests/package/prepare-root.sh ROOT DEB
+#   bash tests/package/prepare-root.sh ROOT DEB
 # ROOT/pristine is `debootstrap --variant=minbase bookworm` from this machine's configured Debian
 # mirror (made once and kept), with every package that installing DEB and a desktop's opener need
 # downloaded into its apt cache, so that the tests install offline, in a network namespace of their

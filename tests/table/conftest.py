@@ -12,6 +12,10 @@
 # "address_space": BYTES}), env (more variables); app(runtime="fifo"|"cut:N") (libjvm.so cut to N bytes,
 # a negative N: N bytes short) and runtime="moved"|"foreign"|"truncated" (a copy of the runtime in the
 # application folder; with Debian's JDK's class-data archive; with its own archive cut short).
+# Besides: name, docs (the documents folder), picture and screen (sizes), raised (how many windows an
+# activation raises), text(TEXT) (a box text with the platform's runtime path), write_failed; Linux also
+# build, display, runtime and trained_with (the build's runtime and the jar it was trained with); Wine
+# also env and drive_c.
 #
 # vm-script.txt in the application directory, key=value lines: create=N (JNI_CreateJavaVM result),
 # missing_class=NAME, missing_method=1, main_ms=N, until=NAME (main runs until app/NAME exists),
@@ -23,6 +27,7 @@
 import itertools
 import shutil
 import socket
+import struct
 import subprocess
 import threading
 import time
@@ -56,11 +61,15 @@ class App:
 
 
 class Listener(threading.Thread):  # the running application's end of the hand-off: keeps what arrives
-    # until the sender closes; counts connections
-    def __init__(self):
+    # until the sender closes; counts connections. With `reset`, it reads nothing through a small
+    # window, so the sender is still sending a second later, and then resets the connection: a sender
+    # that does not guard against it dies of SIGPIPE on its next send.
+    def __init__(self, reset=False):
         super().__init__(daemon=True)
-        self.received, self.connections, self.closed_by_sender = b"", 0, False
+        self.received, self.connections, self.closed_by_sender, self.reset = b"", 0, False, reset
         self.sock = port_free()
+        if reset:
+            self.sock.setsockopt(socket.SOL_SOCKET, socket.SO_RCVBUF, 4096)
         self.sock.listen(4)
         self.sock.settimeout(60)
 
@@ -69,6 +78,10 @@ class Listener(threading.Thread):  # the running application's end of the hand-o
             conn, self.connections = self.sock.accept()[0], 1
         except OSError:
             return  # nobody came: the row's check says so
+        if self.reset:
+            time.sleep(1)
+            conn.setsockopt(socket.SOL_SOCKET, socket.SO_LINGER, struct.pack("ii", 1, 0))
+            return conn.close()
         conn.settimeout(30)
         while not self.closed_by_sender:
             chunk = conn.recv(1 << 16)

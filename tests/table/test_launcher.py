@@ -16,6 +16,7 @@ import time
 import zipfile
 from pathlib import Path
 
+import linux
 from conftest import Listener, hexed, port_free
 
 REINSTALL = "reinstall QZ-Lumiscope QZ-57"
@@ -186,6 +187,9 @@ ROWS = [
         run=dict(lock=True, listener=True), boxes=[], vm_loaded=False,
         received="".join(map(hexed, ["-noSplash", "-x", "C:\\a.dat", "x", "x", "x", "\U0001F600\u00e9\u00ab", LONG]))),
     Row("hand-off-empty-first", ["", "x"], run=dict(lock=True, listener=True), received="0078"),
+    # The running application resets the connection while a long hand-off is still being sent.
+    Row("hand-off-reset-by-listener", ["x" * 100000] * 15, run=dict(lock=True, listener="reset"), boxes=[], vm_loaded=False,
+        only="linux"),
     Row("activation", run=dict(lock=True, listener=True, windows=[  # the first `platform.raised` are raised
         ("i", FRAME, LOCK_UNITS), ("z", FRAME, "\u5858" + LOCK_UNITS), ("i", JAVA_FRAME, LOCK_UNITS + " x"),
         ("h", FRAME, LOCK_UNITS + "1A"), ("i", FRAME, "\u7a71" + LOCK_UNITS[1:]),      # hidden; "qz-Lumi..."
@@ -213,7 +217,7 @@ def check_log(data, lines):
 
 def test_row(platform, row):
     app, want = platform.app(**row.app), row.expect
-    inputs = {**row.run, "listener": row.run.get("listener") and Listener()}
+    inputs = {**row.run, "listener": row.run.get("listener") and Listener(reset=row.run["listener"] == "reset")}
     out = platform.run(app, row.args, splash=bool(want.get("splash")), **inputs)
     assert (out.killed, out.code) == (False, want["code"])
     if "boxes" in want:
@@ -295,24 +299,25 @@ def test_runtime_made_for_its_application(platform, tmp_path):
     assert "archive is valid" in shared and re.search(r"Expecting -Djava\.class\.path=$", shared, re.M)
     assert set(classes.values()) == {"boot_loader"} and {f"javax.swing.{name}" for name in (
         "JList", "JMenuBar", "JTree", "JTable", "JTextArea", "JOptionPane", "JFileChooser")} <= classes.keys()
-    elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.open("rb").read(4) == b"\x7fELF"]
-    sections = {f.name: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
+    elf = [f for f in platform.runtime.rglob("*") if f.is_file() and f.read_bytes()[:4] == b"\x7fELF"]
+    sections = {f: subprocess.run(["readelf", "-SW", f], capture_output=True, text=True, check=True).stdout for f in elf}
     assert len(elf) > 20 and {f for f, s in sections.items() if " .symtab " in s or " .dynsym " not in s} == set()
-    make = lambda out, jar: subprocess.run(["bash", Path(__file__).parents[2] / "runtime/make-jre.sh", out, "--app", jar],
-                                           capture_output=True, text=True)
-    made, archive = platform.runtime.parent, tmp_path / "made/jre/lib/server/classes.jsa"
-    assert "up to date" in make(made, platform.trained_with).stdout
-    (tmp_path / "made").mkdir()
-    shutil.copytree(platform.runtime, tmp_path / "made/jre", symlinks=True)
-    shutil.copy(made / ".jre-inputs", tmp_path / "made")
+    # The tool runs on a copy only: the build's own runtime stays as every row links it.
+    made, archive = tmp_path / "runtime", tmp_path / "runtime/jre/lib/server/classes.jsa"
+    made.mkdir()
+    shutil.copytree(platform.runtime, made / "jre", symlinks=True)
+    shutil.copy(platform.runtime.parent / ".jre-inputs", made)
+    make = lambda jar: subprocess.run(["bash", linux.ROOT / "runtime/make-jre.sh", made, "--app", jar], capture_output=True,
+                                      text=True, env={**os.environ, "JDK": str(linux.JDK.parent)})
+    assert "up to date" in make(platform.trained_with).stdout
     before = archive.stat().st_ino
     with zipfile.ZipFile(shutil.copy(platform.trained_with, tmp_path / "demo.jar"), "a") as jar:  # a new build of the application
         jar.writestr("build.txt", "2")
-    assert "made" in make(tmp_path / "made", tmp_path / "demo.jar").stdout and archive.stat().st_ino != before
+    assert "make-jre: made " in make(tmp_path / "demo.jar").stdout and archive.stat().st_ino != before
     before = archive.stat().st_ino
     with zipfile.ZipFile(tmp_path / "broken.jar", "w") as jar:
         jar.writestr("com/qz/kpo/emu57/app/ApplicationMainForm.class", b"not a class")
-    broken = make(tmp_path / "made", tmp_path / "broken.jar")
+    broken = make(tmp_path / "broken.jar")
     assert broken.returncode and "training with com.qz.kpo.emu57.app.ApplicationMainForm" in broken.stderr, broken.stderr
     assert archive.stat().st_ino == before
 
