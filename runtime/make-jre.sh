@@ -39,11 +39,10 @@ set -euo pipefail
 JDK=${JDK:-/usr/lib/jvm/java-17-openjdk-amd64}  # the build passes its JAVA_HOME
 MODULES=java.desktop,java.management
 MAIN=com.qz.kpo.emu57.app.ApplicationMainForm
-# Modules stored uncompressed, by measurement (docs/performance.md): with the archive in place, zip
-# (--compress=2) brought the frame no sooner (1.00x for the demo, 1.01x for a program outside the training,
-# 21 alternating rounds), took about 2 MiB more memory for the latter (the classes it inflates), and made
-# the runtime's share of the Debian package 31.0 MiB instead of 20.3 (zip-compressed data compresses worse
-# again); it saves 24.5 MiB on disk (67.9 against 92.4 MiB). The package is what every user downloads.
+# Modules stored uncompressed, by measurement (docs/performance.md, "The private runtime: training and
+# compression"): with the archive in place zip brings the frame no sooner, costs memory for the classes
+# it inflates and makes the Debian package larger (zip-compressed data compresses worse again); it only
+# saves disk space, and the package is what every user downloads.
 COMPRESS=0
 
 die() { printf 'make-jre: %s\n' "$*" >&2; exit 1; }

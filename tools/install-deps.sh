@@ -26,7 +26,7 @@ BASE_PKGS=(
   openjdk-17-jdk-headless                   # jni.h, javac, jlink and the jmods of the private runtime
   dpkg-dev nsis                             # make package: dpkg-shlibdeps for the Debian package, makensis
   lintian appstream desktop-file-utils      # the package checks
-  debootstrap libglib2.0-bin xdg-utils      # a minimal Debian 12 to install into; the desktop's opener
+  debootstrap                               # a minimal Debian 12 to install the package into
   binutils                                  # strip: the private runtime's native files
   openjdk-17-jre                            # make bench: Debian's own java with Swing, beside the launcher
 )

@@ -73,8 +73,7 @@ def build(a):
         d = f'{b}/wine-app'
         os.makedirs(f'{d}/jre/bin/client', exist_ok=True)
         shutil.copy2(a.exe, f'{d}/{EXE}.exe')
-        for dll in [f'{a.build}/x86_64/tests/wine/vmdouble/jvm.dll', f'{a.build}/x86_64/tests/wine/jvm.dll']:
-            os.path.exists(dll) and shutil.copy2(dll, f'{d}/jre/bin/client/jvm.dll')
+        shutil.copy2(f'{a.build}/x86_64/tests/wine/jvm.dll', f'{d}/jre/bin/client/jvm.dll')
         open(f'{d}/emu57.jar', 'w').close()
 
 def environment(a, **extra):
@@ -362,14 +361,13 @@ def document(a, R, text, missed, size_text):
     med = lambda v: f'{statistics.median(v):.1f}' if v else '?'
     notes = ''.join(f'- Not met in this run: {what}' + (f', against {alt}' if len(alts) > 1 else '') + '.\n'
                     for key, what, _, alts, _ in FIGS for k, alt in missed if k == key)
-    # $med_<figure>, $alt_<figure> and $alt2_<figure> (medians of the launcher and its alternatives),
-    # $ratio_<figure> and $ratio2_<figure>.
-    figures = {f'med_{key}': f'{statistics.median(R[key][0]):.2f}' if R[key][0] else '?' for key, *_ in FIGS}
-    for n, suffix in [(1, ''), (2, '2')]:
-        figures.update({f'alt{suffix}_{key}': f'{statistics.median(R[key][n]):.2f}' if R[key][n:n + 1] and R[key][n] else '?'
-                        for key, *_ in FIGS})
-        figures.update({f'ratio{suffix}_{key}': f'{statistics.median([x / y for x, y in zip(R[key][0], R[key][n])]):.2f}'
-                        if R[key][0] and R[key][n:n + 1] and R[key][n] else '?' for key, *_ in FIGS})
+    # $med_<figure>, $alt_<figure> (medians of the launcher and its first alternative) and $ratio_<figure>.
+    figures = {}
+    for key, *_ in FIGS:
+        mine, alt = R[key][0], (R[key][1] if len(R[key]) > 1 else [])
+        figures[f'med_{key}'] = f'{statistics.median(mine):.2f}' if mine else '?'
+        figures[f'alt_{key}'] = f'{statistics.median(alt):.2f}' if alt else '?'
+        figures[f'ratio_{key}'] = f'{statistics.median([x / y for x, y in zip(mine, alt)]):.2f}' if mine and alt else '?'
     return string.Template(open(f'{HERE}/performance.md.in').read()).substitute(figures,
         command=a.command, date=datetime.date.today(), pairs=a.pairs, machine=machine(), table=text,
         netns='a private network namespace' if os.environ.get('BENCH_NETNS') == 'private' else 'the shared network',
